@@ -1,0 +1,27 @@
+#!/usr/bin/env bash
+# Installs everything the project builds, tests and benchmarks with, from
+# Debian 12's packages. Safe to run more than once.
+set -euo pipefail
+
+packages=(
+  build-essential g++ clang cmake ninja-build ccache pkg-config git
+  libicu-dev uuid-dev
+  googletest libgtest-dev libgmock-dev libbenchmark-dev
+  g++-mingw-w64-x86-64-posix wine64
+  libsndfile1-dev sndfile-programs sox ffmpeg
+  libboost-dev libmimalloc-dev libjemalloc-dev libgoogle-perftools-dev
+  clang-format
+)
+
+missing=()
+for p in "${packages[@]}"; do
+  dpkg-query -W -f='${Status}' "$p" 2>/dev/null | grep -q "install ok installed" || missing+=("$p")
+done
+
+if [ ${#missing[@]} -gt 0 ]; then
+  sudo=""
+  [ "$(id -u)" -eq 0 ] || sudo="sudo"
+  $sudo apt-get update -q
+  DEBIAN_FRONTEND=noninteractive $sudo apt-get install -y -q --no-install-recommends "${missing[@]}"
+fi
+echo "setup: all packages present"
