@@ -1,3 +1,4 @@
+#include <mmsystem.h>
 #include <windows.h>
 
 #include "tarn/Time/TarnSystemTimeImpl.h"
