@@ -86,6 +86,17 @@ PathKind GetPathKind(const UString& path) noexcept {
   return PathKind::kFile;
 }
 
+bool IsExistingFile(const UString& path) noexcept {
+  // Opening (rather than GetFileAttributesW) also finds alternate data streams.
+  HANDLE h = OpenForAttributes(path, FILE_READ_ATTRIBUTES);
+  if (h == INVALID_HANDLE_VALUE) return false;
+  BY_HANDLE_FILE_INFORMATION info;
+  const bool isFile = ::GetFileInformationByHandle(h, &info) &&
+                      (info.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY) == 0;
+  ::CloseHandle(h);
+  return isFile;
+}
+
 void CreateNewFile(const UString& path) {
   HANDLE h = ::CreateFileW(Native(path), GENERIC_READ, 0, nullptr, CREATE_NEW,
                            FILE_ATTRIBUTE_NORMAL, nullptr);

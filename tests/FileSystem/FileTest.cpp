@@ -185,7 +185,7 @@ TEST_F(FileTest, RenameMoveReplaceDelete) {
   File a = File::CreateOnDisk(In(U("a.wav")), "WAVE", 0);
   WriteAll(a.Open("wb"), "A");
   const File b = File::CreateOnDisk(In(U("b.wav")), "WAVE", 0);
-  ExpectSystemError([&] { a.Rename(U("b.wav")); }, tarntest::ExistsCode(),
+  ExpectSystemError([&] { a.Rename(U("b.wav")); }, tarntest::RenameExistsCode(),
                     In(U("a.wav")).GetFullPath() + U("\n") + In(U("b.wav")).GetFullPath());
   EXPECT_EQ(a.GetSpecification().GetName(), U("a.wav"));
   a.Rename(U("c.wav"));

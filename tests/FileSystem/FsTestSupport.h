@@ -33,6 +33,7 @@ inline std::filesystem::path ToPath(const tarn::UString& s) {
 const char* SystemKind();
 int ExistsCode();
 int NotFoundCode();
+int RenameExistsCode();  // renaming onto an existing name
 
 class TempFolderTest : public ::testing::Test {
  protected:

@@ -6,6 +6,7 @@ namespace tarntest {
 const char* SystemKind() { return "POSIX"; }
 int ExistsCode() { return EEXIST; }
 int NotFoundCode() { return ENOENT; }
+int RenameExistsCode() { return EEXIST; }
 }  // namespace tarntest
 
 namespace {
