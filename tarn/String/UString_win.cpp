@@ -129,9 +129,10 @@ UTF16String NormalizeKC(const UTF16String& s) { return Normalize(NormalizationKC
 bool SystemIsRoman() { return GetACP() == 1252; }
 
 std::int64_t LocalOffsetSeconds(std::int64_t unixSeconds) {
-  // The C runtime (which honours TZ) rejects times before 1970; those use the
-  // offset in force at 1970.
-  const __time64_t t = static_cast<__time64_t>(unixSeconds < 0 ? 0 : unixSeconds);
+  // The C runtime (which honours TZ) rejects times whose local time falls
+  // before 1970; earlier times use the offset in force early in January 1970.
+  constexpr std::int64_t kEarliest = 2 * 86400;
+  const __time64_t t = static_cast<__time64_t>(unixSeconds < kEarliest ? kEarliest : unixSeconds);
   std::tm local{};
   if (_localtime64_s(&local, &t) != 0) return 0;
   const __time64_t asUTC = _mkgmtime64(&local);
