@@ -205,6 +205,9 @@ double CStream::_GetDouble() {
   char text[kMaxDoubleText + 1] = {};
   const int count = GetThruN(text, 0, kMaxDoubleText);
   if (count <= 0) FailStream(kNoNumberText);
+  // Text that stops short of its NUL before the limit was cut off by the
+  // end of the data, and a cut number must not pass for a shorter one.
+  if (count < kMaxDoubleText && text[count - 1] != 0) Failure(-39);
   text[count] = 0;
   double value = 0;
   if (std::sscanf(text, "%lf", &value) != 1) FailStream(kNoNumberText);

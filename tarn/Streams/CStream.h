@@ -137,7 +137,8 @@ class CStream {
   [[nodiscard]] tarnPoint GetPoint();
   virtual void GetRect(tarnRect& r);
   [[nodiscard]] tarnRect GetRect();
-  // Fails with 2 when no number text is found.
+  // Fails with 2 when no number text is found, with -39 when the data end
+  // inside the text.
   [[nodiscard]] virtual double _GetDouble();
   [[nodiscard]] virtual double GetIEEEDouble();
   // Texts over 65,535 bytes are cut there; the stream still moves past the
