@@ -144,7 +144,11 @@ void CStream::PutFloatArray(const float* a, int count) { PutSwappedArray(*this, 
 
 // ---- reading ----
 
-void CStream::GetStr(char* buffer, int max) { GetThruN(buffer, 0, max); }
+void CStream::GetStr(char* buffer, int max) {
+  const int count = GetThruN(buffer, 0, max);
+  // Short of both the NUL and the limit: the data ended inside the string.
+  if (count < max && (count == 0 || buffer[count - 1] != 0)) Failure(-39);
+}
 
 void CStream::GetStr255(unsigned char* buffer) {
   const auto length = static_cast<unsigned char>(GetChar());

@@ -31,12 +31,17 @@ PipedStream::PipedStream(PipedStream& otherEnd) : pipe_(otherEnd.pipe_), isReadi
   Open(kTCLReadMode);
 }
 
-PipedStream::~PipedStream() {
+PipedStream::~PipedStream() { Close(); }
+
+void PipedStream::Close() {
+  if (!attached_) return;
+  attached_ = false;
   {
     std::lock_guard lock(pipe_->mutex);
     --pipe_->ends;
   }
   pipe_->arrived.notify_all();
+  CStream::Close();
 }
 
 std::int64_t PipedStream::Size() {

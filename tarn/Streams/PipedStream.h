@@ -7,7 +7,8 @@
 // on two threads at once; each end by one thread at a time. Writes never
 // block. A read blocks until all its bytes have arrived; once the other end
 // has been destroyed, a read that cannot be completed fails with -39 after
-// taking what was there. GetThruN returns what it has at that point instead.
+// taking what was there (Close on an end has the same effect as destroying
+// it). GetThruN returns what it has at that point instead.
 //
 // Positions count the bytes this end has moved. MoveTo accepts the current
 // position, and on the reading end a later one (the bytes in between are
@@ -36,6 +37,10 @@ class PipedStream : public CStream {
   PipedStream& operator=(const PipedStream&) = delete;
   ~PipedStream() override;
 
+  // Leaves the pipe: the other end then sees the end of the data once it
+  // has read what is waiting. A closed end cannot be reopened.
+  void Close() override;
+
   [[nodiscard]] std::int64_t Position() override { return transferred_; }
   [[nodiscard]] std::int64_t Size() override;
   void MoveTo(std::int64_t position) override;
@@ -54,6 +59,7 @@ class PipedStream : public CStream {
 
   std::shared_ptr<Pipe> pipe_;
   bool isReadingEnd_;
+  bool attached_ = true;
   std::int64_t transferred_ = 0;
 };
 

@@ -127,7 +127,10 @@ class PtrChannel : public Channel {
 class PipeChannel : public Channel {
  public:
   CStream& Out() override { return out_; }
-  CStream& In() override { return in_; }
+  CStream& In() override {
+    out_.Close();
+    return in_;
+  }
 
  private:
   PipedStream out_;
