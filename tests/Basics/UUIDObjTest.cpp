@@ -83,7 +83,7 @@ TEST(UUIDObj, NewIdentifiersAreTimeBasedAndDistinct) {
   for (int i = 0; i < 1000; ++i) {
     const UUIDObj u = UUIDObj::GetNewUUID();
     ASSERT_FALSE(u.IsClear());
-    EXPECT_EQ(u.GetBytes()[6] >> 4, 1);       // version 1: time-based
+    EXPECT_EQ(u.GetBytes()[6] >> 4, 1);  // version 1: time-based
     EXPECT_TRUE(seen.insert(u.GetBytes()).second);
     EXPECT_EQ(UUIDObj(u.GetString()), u);
   }

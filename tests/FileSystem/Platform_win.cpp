@@ -2,8 +2,8 @@
 
 namespace tarntest {
 const char* SystemKind() { return "Windows"; }
-int ExistsCode() { return 80; }   // ERROR_FILE_EXISTS
-int NotFoundCode() { return 2; }  // ERROR_FILE_NOT_FOUND
+int ExistsCode() { return 80; }         // ERROR_FILE_EXISTS
+int NotFoundCode() { return 2; }        // ERROR_FILE_NOT_FOUND
 int RenameExistsCode() { return 183; }  // ERROR_ALREADY_EXISTS
 }  // namespace tarntest
 
