@@ -4,6 +4,7 @@
 #include <cmath>
 #include <limits>
 
+#include "tarn/Streams/CStream.h"
 #include "tarn/Time/WrappingMath.h"
 
 namespace tarn {
@@ -115,6 +116,31 @@ std::int32_t SampleCount::GetSInt32AssertingRange(std::int32_t min,
   return static_cast<std::int32_t>(value_);
 }
 
+void SampleCount::PutTo(CStream& stream) const { stream.PutLongLong(value_); }
+
+void SampleCount::GetFrom(CStream& stream) { value_ = stream.GetLongLong(); }
+
+void SampleCount::PutTo(CStream& stream, bool as64Bit) const {
+  if (as64Bit) {
+    stream.PutLongLong(value_);
+  } else {
+    stream.PutLong(GetSInt32PinningToRange(std::numeric_limits<std::int32_t>::min(),
+                                           std::numeric_limits<std::int32_t>::max()));
+  }
+}
+
+void SampleCount::GetFrom(CStream& stream, bool as64Bit) {
+  value_ = as64Bit ? stream.GetLongLong() : stream.GetLong();
+}
+
+std::int64_t SampleCount::Get_LLorL(CStream& stream, bool as32Bit) {
+  return as32Bit ? stream.GetLong() : stream.GetLongLong();
+}
+
+SampleCount SampleCount::Get_LLorL_SampleCount(CStream& stream, bool as32Bit) {
+  return Get_LLorL(stream, as32Bit);
+}
+
 SampleCountFrac SampleCountFrac::Abs() const noexcept { return std::fabs(value_); }
 bool SampleCountFrac::IsNotANumber() const noexcept { return std::isnan(value_); }
 SampleCountFrac SampleCountFrac::Floor() const noexcept { return std::floor(value_); }
@@ -130,5 +156,9 @@ float SampleCountFrac::GetFloat32AssertingRange() const noexcept {
   if (value_ < -kLimit) return static_cast<float>(-kLimit);
   return static_cast<float>(value_);
 }
+
+void SampleCountFrac::PutTo(CStream& stream) const { stream.PutIEEEDouble(value_); }
+
+void SampleCountFrac::GetFrom(CStream& stream) { value_ = stream.GetIEEEDouble(); }
 
 }  // namespace tarn
