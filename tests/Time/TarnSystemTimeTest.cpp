@@ -47,7 +47,11 @@ std::int64_t DaysSince1904(int y, int m, int d) {
 
 class TarnSystemTimeUtc : public ::testing::Test {
  protected:
-  static void SetUpTestSuite() { testing::UseUtcTimeZone(); }
+  static void SetUpTestSuite() { utc_ = testing::UseUtcTimeZone(); }
+  void SetUp() override {
+    if (!utc_) GTEST_SKIP() << "the system time zone is not UTC; run with TZ=UTC";
+  }
+  static inline bool utc_ = false;
 };
 
 TEST_F(TarnSystemTimeUtc, EpochAndKnownDates) {

@@ -1,7 +1,9 @@
-// Puts the process's C runtime in the UTC time zone (TZ=UTC), so that date
-// tests give the same answers on every machine.
+// Puts the process in the UTC time zone (TZ=UTC) for date tests. Returns
+// whether the platform's local-time conversion now follows UTC: on Windows
+// it follows the system's zone, which a process cannot change for itself
+// (under Wine, the host's TZ at start-up).
 #pragma once
 
 namespace tarn::testing {
-void UseUtcTimeZone();
+bool UseUtcTimeZone();
 }  // namespace tarn::testing

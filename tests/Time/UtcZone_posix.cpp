@@ -4,8 +4,9 @@
 #include "UtcZone.h"
 
 namespace tarn::testing {
-void UseUtcTimeZone() {
+bool UseUtcTimeZone() {
   setenv("TZ", "UTC", 1);
   tzset();
+  return true;
 }
 }  // namespace tarn::testing
