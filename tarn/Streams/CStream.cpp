@@ -144,7 +144,11 @@ void CStream::PutFloatArray(const float* a, int count) { PutSwappedArray(*this, 
 
 // ---- reading ----
 
-void CStream::GetStr(char* buffer, int max) { GetThruN(buffer, 0, max); }
+void CStream::GetStr(char* buffer, int max) {
+  const int count = GetThruN(buffer, 0, max);
+  // Short of both the NUL and the limit: the data ended inside the string.
+  if (count < max && (count == 0 || buffer[count - 1] != 0)) Failure(-39);
+}
 
 void CStream::GetStr255(unsigned char* buffer) {
   const auto length = static_cast<unsigned char>(GetChar());
@@ -205,6 +209,9 @@ double CStream::_GetDouble() {
   char text[kMaxDoubleText + 1] = {};
   const int count = GetThruN(text, 0, kMaxDoubleText);
   if (count <= 0) FailStream(kNoNumberText);
+  // Text that stops short of its NUL before the limit was cut off by the
+  // end of the data, and a cut number must not pass for a shorter one.
+  if (count < kMaxDoubleText && text[count - 1] != 0) Failure(-39);
   text[count] = 0;
   double value = 0;
   if (std::sscanf(text, "%lf", &value) != 1) FailStream(kNoNumberText);
