@@ -6,6 +6,7 @@
 #include <cstdint>
 
 #include "UtcZone.h"
+#include "tarn/Errors/TarnError.h"
 
 namespace tarn {
 namespace {
@@ -66,6 +67,23 @@ TEST_F(TarnSystemTimeUtc, EpochAndKnownDates) {
   DateTimeRec withWeekday = Date(2001, 1, 1);
   withWeekday.dayOfWeek = 3;
   EXPECT_EQ(ToSeconds(withWeekday), 3061152000u);
+}
+
+TEST(TarnSystemTime, DatesThatDoNotExistThrow) {
+  EXPECT_THROW(ToSeconds(Date(2001, 13, 1)), TarnError);
+  EXPECT_THROW(ToSeconds(Date(2001, 2, 29)), TarnError);
+  EXPECT_THROW(ToSeconds(Date(2001, 4, 31)), TarnError);
+  EXPECT_THROW(ToSeconds(Date(2001, 1, 1, 24)), TarnError);
+  EXPECT_THROW(ToSeconds(Date(2001, 1, 1, 0, 60)), TarnError);
+  EXPECT_THROW(ToSeconds(Date(2001, 1, 1, 0, 0, -1)), TarnError);
+  EXPECT_THROW(ToSeconds(Date(1600, 12, 31)), TarnError);
+  try {
+    (void)ToSeconds(Date(2001, 1, 32));
+    ADD_FAILURE() << "no error";
+  } catch (const TarnError& e) {
+    EXPECT_EQ(static_cast<int>(e.GetErrorCode()), -50);
+  }
+  EXPECT_NO_THROW(ToSeconds(Date(2000, 2, 29)));
 }
 
 TEST_F(TarnSystemTimeUtc, SecondsToDateFillsEveryField) {
