@@ -99,6 +99,31 @@ TEST(TockFrac, AddSubtractExhaustiveAgainstReference) {
   }
 }
 
+// Sums normalise any numerator, canonical or not, to the same exact value.
+TEST(TockFrac, SumsNormaliseEveryNumerator) {
+  using F = Frac<kD>;
+  for (int w = -3; w <= 3; ++w) {
+    for (std::int64_t n = -2147483647 - 1; n <= 2147483647; n += 7199999) {
+      for (int d : {0, 1, -1}) {
+        const std::int64_t nn = n + d;
+        if (nn < -2147483647 - 1 || nn > 2147483647) continue;
+        const F raw(w, static_cast<int>(nn), F::AlreadyCanonical{});
+        const F sum = raw + F();
+        const F diff = raw - F();
+        ASSERT_TRUE(IsCanonical(sum)) << w << "," << nn;
+        ASSERT_EQ(Tocks(sum), std::int64_t{w} * kD + nn) << w << "," << nn;
+        ASSERT_EQ(diff, sum);
+      }
+    }
+    for (int n : {-14400000, -14399999, -7200001, -7200000, -7199999, 7199999, 7200000, 14399999,
+                  14400000}) {
+      const F sum = F(w, n, F::AlreadyCanonical{}) + F();
+      ASSERT_EQ(Tocks(sum), std::int64_t{w} * kD + n) << w << "," << n;
+      ASSERT_TRUE(IsCanonical(sum));
+    }
+  }
+}
+
 TEST(TockFrac, CarryAndBorrow) {
   EXPECT_EQ(TockFrac(0, 7199999) + TockFrac(0, 1), TockFrac(1, 0));
   EXPECT_EQ(TockFrac(1, 0) - TockFrac(0, 1), TockFrac(0, 7199999));
