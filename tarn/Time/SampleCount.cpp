@@ -1,9 +1,9 @@
 #include "tarn/Time/SampleCount.h"
 
-#include <cassert>
 #include <cmath>
 #include <limits>
 
+#include "tarn/Errors/TarnAssert.h"
 #include "tarn/Streams/CStream.h"
 #include "tarn/Time/WrappingMath.h"
 
@@ -104,13 +104,17 @@ std::int32_t SampleCount::SubtractWithPositiveSInt32Result(SampleCount other) co
 }
 
 std::int32_t SampleCount::GetSInt32AssertingRange() const noexcept {
-  assert(CanFitInSInt32());
+#ifndef NDEBUG
+  TARN_ASSERT(CanFitInSInt32());
+#endif
   return static_cast<std::int32_t>(value_);
 }
 
 std::int32_t SampleCount::GetSInt32AssertingRange(std::int32_t min,
                                                   std::int32_t max) const noexcept {
-  assert(value_ >= min && value_ <= max);
+#ifndef NDEBUG
+  TARN_ASSERT(value_ >= min && value_ <= max);
+#endif
   (void)min;
   (void)max;
   return static_cast<std::int32_t>(value_);

@@ -6,6 +6,8 @@
 #include <random>
 #include <vector>
 
+#include "tarn/Errors/TarnError.h"
+
 namespace tarn {
 namespace {
 
@@ -103,6 +105,8 @@ TEST(TimeRegion, UnionIntersectionSubtraction) {
 TEST(TimeRegion, Queries) {
   TimeRegion r(std::vector<Range>{{20, 25}, {0, 5}, {10, 15}}, false);
   EXPECT_EQ(RangesOf(r), (std::vector<Range>{{0, 5}, {10, 15}, {20, 25}}));
+  EXPECT_THROW((void)r.NthRange(3), TarnError);
+  EXPECT_THROW((void)r.NthRange(-1), TarnError);
   EXPECT_EQ(r.FindIndex(-1), 0);
   EXPECT_EQ(r.FindIndex(0), 0);
   EXPECT_EQ(r.FindIndex(1), 1);
