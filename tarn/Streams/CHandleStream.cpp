@@ -23,6 +23,19 @@ CHandleStream::CHandleStream(TCLStreamMode mode)
   if (mode != kTCLClosedMode) Open(mode);
 }
 
+CHandleStream::~CHandleStream() {
+  try {
+    if (!ownsBuffer_) (void)GetStreamHandle();
+  } catch (...) {
+    // Trimming only gives memory back; the data are intact either way.
+  }
+}
+
+void CHandleStream::Close() {
+  (void)GetStreamHandle();
+  CStream::Close();
+}
+
 void CHandleStream::Open(TCLStreamMode mode) {
   if (!buffer_) {
     const int size = bufferSize_ > 0 ? bufferSize_ : blockSize_;

@@ -27,11 +27,14 @@ class CHandleStream : public CBufferedStream {
   explicit CHandleStream(TCLStreamMode mode = kTCLClosedMode);
   CHandleStream(const CHandleStream&) = delete;
   CHandleStream& operator=(const CHandleStream&) = delete;
-  ~CHandleStream() override = default;
+  // Leave the handle trimmed to the data.
+  ~CHandleStream() override;
 
   // Opens at position 0 and keeps the block's content.
   void Open(TCLStreamMode mode) override;
   void Truncate(std::int64_t size) override;
+  // Trims the handle to the data; the handle stays with the stream.
+  void Close() override;
 
   // The handle, trimmed to the stream's data; the stream keeps (or does not
   // keep) ownership as before.

@@ -21,7 +21,7 @@ namespace tarn {
 
 template <int D>
 class Frac {
-  static_assert(D > 1, "the denominator must exceed 1");
+  static_assert(D > 1 && D <= (1 << 30), "the denominator must lie in 2..2^30");
 
  public:
   // Selects the constructor that stores a pair already known to be canonical.
@@ -98,13 +98,19 @@ class Frac {
     }
   }
 
-  // Brings a numerator from anywhere in the int range into (-D, D) by division.
+  // Brings a numerator from anywhere in the int range into (-D, D): one step
+  // for sums of canonical numerators, by division beyond.
   static constexpr Frac Normalized(int whole, int numerator) noexcept {
     Frac r(whole, numerator, AlreadyCanonical{});
     if (numerator == 0) return r;
     if (numerator >= D) {
-      r.whole_ = detail::WrapAdd32(whole, numerator / D);
-      r.numerator_ = numerator % D;
+      // The sum of two canonical numerators needs one step: skip the division.
+      const bool oneStep = numerator - D < D;
+      r.whole_ = detail::WrapAdd32(whole, oneStep ? 1 : numerator / D);
+      r.numerator_ = oneStep ? numerator - D : numerator % D;
+    } else if (numerator <= -D && numerator > -2 * D) {
+      r.numerator_ = numerator + D;
+      r.whole_ = detail::WrapSub32(whole, 1);
     } else if (numerator < -(D - 1)) {
       const int k = static_cast<int>((-static_cast<std::int64_t>(D) - numerator) / D + 1);
       r.numerator_ = static_cast<int>(numerator + static_cast<std::int64_t>(k) * D);

@@ -1,9 +1,10 @@
 #include "tarn/Time/SampleCount.h"
 
-#include <cassert>
 #include <cmath>
 #include <limits>
 
+#include "tarn/Errors/TarnAssert.h"
+#include "tarn/Streams/CStream.h"
 #include "tarn/Time/WrappingMath.h"
 
 namespace tarn {
@@ -103,16 +104,45 @@ std::int32_t SampleCount::SubtractWithPositiveSInt32Result(SampleCount other) co
 }
 
 std::int32_t SampleCount::GetSInt32AssertingRange() const noexcept {
-  assert(CanFitInSInt32());
+#ifndef NDEBUG
+  TARN_ASSERT(CanFitInSInt32());
+#endif
   return static_cast<std::int32_t>(value_);
 }
 
 std::int32_t SampleCount::GetSInt32AssertingRange(std::int32_t min,
                                                   std::int32_t max) const noexcept {
-  assert(value_ >= min && value_ <= max);
+#ifndef NDEBUG
+  TARN_ASSERT(value_ >= min && value_ <= max);
+#endif
   (void)min;
   (void)max;
   return static_cast<std::int32_t>(value_);
+}
+
+void SampleCount::PutTo(CStream& stream) const { stream.PutLongLong(value_); }
+
+void SampleCount::GetFrom(CStream& stream) { value_ = stream.GetLongLong(); }
+
+void SampleCount::PutTo(CStream& stream, bool as64Bit) const {
+  if (as64Bit) {
+    stream.PutLongLong(value_);
+  } else {
+    stream.PutLong(GetSInt32PinningToRange(std::numeric_limits<std::int32_t>::min(),
+                                           std::numeric_limits<std::int32_t>::max()));
+  }
+}
+
+void SampleCount::GetFrom(CStream& stream, bool as64Bit) {
+  value_ = as64Bit ? stream.GetLongLong() : stream.GetLong();
+}
+
+std::int64_t SampleCount::Get_LLorL(CStream& stream, bool as32Bit) {
+  return as32Bit ? stream.GetLong() : stream.GetLongLong();
+}
+
+SampleCount SampleCount::Get_LLorL_SampleCount(CStream& stream, bool as32Bit) {
+  return Get_LLorL(stream, as32Bit);
 }
 
 SampleCountFrac SampleCountFrac::Abs() const noexcept { return std::fabs(value_); }
@@ -130,5 +160,9 @@ float SampleCountFrac::GetFloat32AssertingRange() const noexcept {
   if (value_ < -kLimit) return static_cast<float>(-kLimit);
   return static_cast<float>(value_);
 }
+
+void SampleCountFrac::PutTo(CStream& stream) const { stream.PutIEEEDouble(value_); }
+
+void SampleCountFrac::GetFrom(CStream& stream) { value_ = stream.GetIEEEDouble(); }
 
 }  // namespace tarn

@@ -22,7 +22,8 @@ class SampleCount {
  public:
   constexpr SampleCount() noexcept = default;
   constexpr SampleCount(std::int64_t value) noexcept : value_(value) {}  // NOLINT: implicit
-  explicit SampleCount(const SampleCountFrac& frac) noexcept;            // truncates toward zero
+  // Truncates toward zero; NaN or out of range gives the most negative count.
+  explicit SampleCount(const SampleCountFrac& frac) noexcept;
   constexpr SampleCount(const SampleCount&) noexcept = default;
   constexpr SampleCount& operator=(const SampleCount&) noexcept = default;
 
@@ -68,7 +69,7 @@ class SampleCount {
   // this - other clamped to [-2^31, 2^31 - 1] and [0, 2^31 - 1], free of overflow.
   [[nodiscard]] std::int32_t SubtractWithSInt32Result(SampleCount other) const noexcept;
   [[nodiscard]] std::int32_t SubtractWithPositiveSInt32Result(SampleCount other) const noexcept;
-  // The low 32 bits; the caller guarantees the range (asserted in debug builds).
+  // The low 32 bits; the caller guarantees the range (TARN_ASSERT unless NDEBUG).
   [[nodiscard]] std::int32_t GetSInt32AssertingRange() const noexcept;
   [[nodiscard]] std::int32_t GetSInt32AssertingRange(std::int32_t min,
                                                      std::int32_t max) const noexcept;

@@ -1,5 +1,6 @@
 #include "tarn/Time/TarnSystemTime.h"
 
+#include "tarn/Errors/Fail.h"
 #include "tarn/Time/TarnSystemTimeImpl.h"
 
 namespace tarn::TarnSystemTime {
@@ -12,6 +13,20 @@ constexpr std::int64_t kFileEpochTo1904 = kFileEpochTo2001 - k1904To2001;
 static_assert(kFileEpochTo1904 == 9561628800);
 
 constexpr double kFileTimeUnitsPerSecond = 1e7;
+
+constexpr bool IsLeapYear(int y) noexcept { return (y % 4 == 0 && y % 100 != 0) || y % 400 == 0; }
+
+int DaysInMonth(int year, int month) noexcept {
+  constexpr int kDays[12] = {31, 28, 31, 30, 31, 30, 31, 31, 30, 31, 30, 31};
+  return month == 2 && IsLeapYear(year) ? 29 : kDays[month - 1];
+}
+
+// Every platform accepts exactly these dates (the range of the Windows calendar).
+bool IsValidDate(const DateTimeRec& d) noexcept {
+  return d.year >= 1601 && d.year <= 30827 && d.month >= 1 && d.month <= 12 && d.day >= 1 &&
+         d.day <= DaysInMonth(d.year, d.month) && d.hour >= 0 && d.hour <= 23 && d.minute >= 0 &&
+         d.minute <= 59 && d.second >= 0 && d.second <= 59;
+}
 
 }  // namespace
 
@@ -33,10 +48,11 @@ void GetDateTime(unsigned int* seconds) noexcept {
   *seconds = static_cast<unsigned int>(fileSeconds - kFileEpochTo1904);
 }
 
-void DateToSeconds(const DateTimeRec* date, unsigned int* seconds) noexcept {
+void DateToSeconds(const DateTimeRec* date, unsigned int* seconds) {
   DateTimeRec d = *date;
   if (d.month < 1) d.month = 1;
   if (d.day < 1) d.day = 1;
+  if (!IsValidDate(d)) Failure(kParamErr);
   *seconds = static_cast<unsigned int>(detail::LocalDateToFileSeconds(d) - kFileEpochTo1904);
 }
 

@@ -7,7 +7,8 @@
 // 32-bit seconds since 1 January 1904, 00:00 UTC, converted to and from
 // calendar dates in the process's local time zone.
 //
-// None of these functions throw or block; all may be called from any thread.
+// None of these functions block, and only DateToSeconds throws; all may be
+// called from any thread.
 #pragma once
 
 #include <cstdint>
@@ -42,9 +43,12 @@ inline constexpr double kUnixToAbsoluteSeconds = 978307200.0;
 // Now, as seconds since 1 January 1904 UTC (low 32 bits).
 void GetDateTime(unsigned int* seconds) noexcept;
 
-// Local date to seconds since 1904 UTC (low 32 bits). Month and day below 1
-// are read as 1; the day of the week is ignored.
-void DateToSeconds(const DateTimeRec* date, unsigned int* seconds) noexcept;
+// Local date to seconds since 1904 UTC (low 32 bits, so dates outside
+// 1904..2040 wrap). Month and day below 1 are read as 1; the day of the week
+// is ignored. Throws TarnError -50 for a date that does not exist: a year
+// outside 1601..30827, a month above 12, a day beyond the month's end, or a
+// time of day outside 00:00:00..23:59:59.
+void DateToSeconds(const DateTimeRec* date, unsigned int* seconds);
 
 // Seconds since 1904 UTC to a local date, day of the week included.
 void SecondsToDate(unsigned int seconds, DateTimeRec* date) noexcept;

@@ -15,8 +15,8 @@ namespace tarn::TarnSystemTime::detail {
 // A monotonic millisecond uptime counter.
 [[nodiscard]] std::uint64_t UptimeMilliseconds() noexcept;
 
-// The local date (month and day already at least 1) as UTC seconds since 1601.
-[[nodiscard]] std::int64_t LocalDateToFileSeconds(const DateTimeRec& date) noexcept;
+// The local date (already validated) as UTC seconds since 1601.
+[[nodiscard]] std::int64_t LocalDateToFileSeconds(const DateTimeRec& date);
 
 // UTC seconds since 1601 to the local date.
 void FileSecondsToLocalDate(std::int64_t fileSeconds, DateTimeRec* date) noexcept;

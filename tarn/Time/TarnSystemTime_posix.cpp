@@ -23,7 +23,7 @@ std::uint64_t UptimeMilliseconds() noexcept {
          static_cast<std::uint64_t>(ts.tv_nsec) / 1000000u;
 }
 
-std::int64_t LocalDateToFileSeconds(const DateTimeRec& date) noexcept {
+std::int64_t LocalDateToFileSeconds(const DateTimeRec& date) {
   tm t{};
   t.tm_year = date.year - 1900;
   t.tm_mon = date.month - 1;

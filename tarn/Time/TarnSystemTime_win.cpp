@@ -1,6 +1,8 @@
-#include <mmsystem.h>
 #include <windows.h>
+// After windows.h, which it needs.
+#include <mmsystem.h>
 
+#include "tarn/Errors/Fail.h"
 #include "tarn/Time/TarnSystemTimeImpl.h"
 
 namespace tarn::TarnSystemTime::detail {
@@ -27,7 +29,7 @@ std::uint64_t FileTimeNow() noexcept {
 
 std::uint64_t UptimeMilliseconds() noexcept { return timeGetTime(); }
 
-std::int64_t LocalDateToFileSeconds(const DateTimeRec& date) noexcept {
+std::int64_t LocalDateToFileSeconds(const DateTimeRec& date) {
   SYSTEMTIME local{};
   local.wYear = static_cast<WORD>(date.year);
   local.wMonth = static_cast<WORD>(date.month);
@@ -41,7 +43,7 @@ std::int64_t LocalDateToFileSeconds(const DateTimeRec& date) noexcept {
   SYSTEMTIME utc{};
   FILETIME ft{};
   if (!TzSpecificLocalTimeToSystemTime(nullptr, &local, &utc) || !SystemTimeToFileTime(&utc, &ft))
-    return 0;
+    FailWinAPIError(0);
   return static_cast<std::int64_t>(ToUInt64(ft) / 10000000u);
 }
 

@@ -2,6 +2,7 @@
 
 #include <cmath>
 
+#include "tarn/Streams/CStream.h"
 #include "tarn/Time/WrappingMath.h"
 
 namespace tarn {
@@ -50,5 +51,9 @@ std::int64_t Tick::operator/(Tick rhs) const noexcept { return detail::WrapDiv(r
 Tick Tick::operator%(Tick rhs) const noexcept {
   return Tick(RawTag{}, detail::WrapRem(raw_, rhs.raw_));
 }
+
+void Tick::PutTo(CStream& stream) const { stream.PutLongLong(raw_); }
+
+void Tick::GetFrom(CStream& stream) { raw_ = stream.GetLongLong(); }
 
 }  // namespace tarn

@@ -15,6 +15,8 @@
 #include <compare>
 #include <cstdint>
 
+#include "tarn/Time/WrappingMath.h"
+
 namespace tarn {
 
 class CStream;
@@ -33,8 +35,7 @@ class Tick {
  public:
   constexpr Tick() noexcept = default;
   constexpr Tick(int wholeTicks) noexcept  // NOLINT: implicit
-      : raw_(static_cast<std::int64_t>(
-            static_cast<std::uint64_t>(static_cast<std::uint32_t>(wholeTicks)) << 32)) {}
+      : raw_(detail::WrapShiftLeft(wholeTicks, 32)) {}
   // d ticks, pinned to +-(2^63 - 1024) raw (the largest doubles that fit),
   // then truncated toward zero. NaN gives 0.
   explicit Tick(double ticks) noexcept;
@@ -108,9 +109,7 @@ class Tick {
 
 // Exactly value / 2^shift ticks, shift in 1..31.
 [[nodiscard]] constexpr Tick MakeTickByShifting(int value, int shift) noexcept {
-  return Tick(Tick::RawTag{},
-              static_cast<std::int64_t>(static_cast<std::uint64_t>(static_cast<std::int64_t>(value))
-                                        << (32 - shift)));
+  return Tick(Tick::RawTag{}, detail::WrapShiftLeft(value, 32 - shift));
 }
 
 }  // namespace tarn

@@ -14,14 +14,16 @@
 //
 // A derived region can mirror every edit in a parallel structure by
 // overriding the protected steps AddUnion, AddReplace, SubtDelRange,
-// SubtInsertRange and SubtUpdateRange. Nothing here throws except on
-// allocation failure; a region belongs to one thread at a time.
+// SubtInsertRange and SubtUpdateRange. Nothing here throws except NthRange
+// (on a bad index) and allocation failure; a region belongs to one thread at a time.
 #pragma once
 
 #include <algorithm>
 #include <limits>
 #include <memory>
 #include <vector>
+
+#include "tarn/Errors/Fail.h"
 
 namespace tarn {
 
@@ -71,7 +73,11 @@ class TimeRegionOf {
   void Clear() noexcept { ranges_.clear(); }
   [[nodiscard]] bool IsEmpty() const noexcept { return ranges_.empty(); }
   [[nodiscard]] int CountRanges() const noexcept { return static_cast<int>(ranges_.size()); }
-  [[nodiscard]] const Range& NthRange(int i) const noexcept { return ranges_[i]; }
+  // Throws TarnError -50 when i is not in [0, CountRanges()).
+  [[nodiscard]] const Range& NthRange(int i) const {
+    if (i < 0 || i >= CountRanges()) Failure(kParamErr);
+    return ranges_[i];
+  }
   [[nodiscard]] const std::vector<Range>& Ranges() const noexcept { return ranges_; }
   [[nodiscard]] bool IsStrictCoalescing() const noexcept { return strictCoalescing_; }
 

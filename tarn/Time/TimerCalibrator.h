@@ -2,8 +2,9 @@
 // platform's high-resolution counter and scaled once at start-up.
 //
 // TimerCalibrator::Instance() is created on first use (thread-safe) and
-// lives until the process ends. No member throws, blocks or allocates; any
-// thread may call them. Clocks count from an arbitrary origin, so only
+// lives until the process ends; it holds no resources, so it needs no place in
+// the singleton registry's teardown and stays usable while statics are destroyed. No member throws,
+// blocks or allocates; any thread may call them. Clocks count from an arbitrary origin, so only
 // differences are meaningful.
 #pragma once
 
@@ -24,6 +25,7 @@ class TimerCalibrator {
   // Clocks per second: 1e7.
   [[nodiscard]] double Frequency() const noexcept { return clocksPerSecond_; }
   [[nodiscard]] double ClocksToSeconds(std::uint64_t clocks) const noexcept;
+  // Negative and NaN give 0; beyond 2^64 clocks saturates.
   [[nodiscard]] std::uint64_t SecondsToClocks(double seconds) const noexcept;
 
  private:

@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "tarn/Errors/TarnError.h"
 #include "tarn/String/UString.h"
 
 namespace tarn {
@@ -112,9 +113,8 @@ TEST(UStringEncoding, MultipleEncodingsOutputIsEmpty) {
 }
 
 TEST(UStringEncoding, UnknownEncodingThrows) {
-  EXPECT_THROW(UString("a", static_cast<UString::ByteEncoding>(5)), std::invalid_argument);
-  EXPECT_THROW((void)UString("a").string(static_cast<UString::ByteEncoding>(-1)),
-               std::invalid_argument);
+  EXPECT_THROW(UString("a", static_cast<UString::ByteEncoding>(5)), TarnError);
+  EXPECT_THROW((void)UString("a").string(static_cast<UString::ByteEncoding>(-1)), TarnError);
 }
 
 TEST(UStringEncoding, StopAtNulEndsTheByteString) {
