@@ -8,8 +8,34 @@
 namespace tarn {
 
 namespace {
+
 // The code of a folder found where a file was demanded.
 constexpr short kNotAFileErr = -1302;
+
+// Where the resource fork is a stream of the file it moves with the file;
+// where it is a file of its own it is moved here. `hadFork` tells whether
+// `from` had a fork before the file moved.
+void CarryResourceFork(const UString& from, const UString& to, bool hadFork) {
+  const UString fromFork = File::ResourceForkPath(from);
+  const UString toFork = File::ResourceForkPath(to);
+  if (fsimpl::IsExistingFile(fromFork)) {
+    fsimpl::RenameReplacing(fromFork, toFork);
+  } else if (!hadFork && fsimpl::IsExistingFile(toFork)) {
+    fsimpl::RemoveFile(toFork);  // a stale fork of a replaced file
+  }
+}
+
+// Renames a file and its resource fork.
+void RenameWithFork(const UString& from, const UString& to, bool replacing) {
+  const bool hadFork = fsimpl::IsExistingFile(File::ResourceForkPath(from));
+  if (replacing) {
+    fsimpl::RenameReplacing(from, to);
+  } else {
+    fsimpl::RenameNoReplace(from, to);
+  }
+  CarryResourceFork(from, to, hadFork);
+}
+
 }  // namespace
 
 File File::CreateOnDisk(const FileSpecification& spec, FileTypeClass, FileTypeClass,
@@ -67,7 +93,7 @@ namespace {
 std::FILE* OpenWithPermission(const UString& path, Permission permission) {
   if (permission == kReadPermission) return fsimpl::OpenFile(path, "rb", true);
   if (std::FILE* f = fsimpl::OpenFile(path, "r+b", false)) return f;
-  if (fsimpl::GetPathKind(path) == fsimpl::PathKind::kNone) fsimpl::CreateNewFile(path);
+  if (!fsimpl::IsExistingFile(path)) fsimpl::CreateNewFile(path);
   return fsimpl::OpenFile(path, "r+b", true);
 }
 }  // namespace
@@ -86,27 +112,32 @@ void File::CloseFork(std::FILE* fork) noexcept {
 
 void File::CreateResourceFork() const {
   const UString fork = ResourceForkPath(fSpec.GetFullPath());
-  if (fsimpl::GetPathKind(fork) == fsimpl::PathKind::kNone) fsimpl::CreateNewFile(fork);
+  if (!fsimpl::IsExistingFile(fork)) fsimpl::CreateNewFile(fork);
 }
 
 void File::ReplaceContents(const File& source) {
-  fsimpl::RenameReplacing(source.fSpec.GetFullPath(), fSpec.GetFullPath());
+  RenameWithFork(source.fSpec.GetFullPath(), fSpec.GetFullPath(), true);
 }
 
 void File::Rename(const UString& newName) {
   FileSpecification target = fSpec;
   target.SetName(newName);
-  fsimpl::RenameNoReplace(fSpec.GetFullPath(), target.GetFullPath());
+  RenameWithFork(fSpec.GetFullPath(), target.GetFullPath(), false);
   fSpec = target;
 }
 
 void File::MoveTo(const FileSpecification& folder, const UString& name) {
   FileSpecification target(folder, name);
-  fsimpl::RenameNoReplace(fSpec.GetFullPath(), target.GetFullPath());
+  RenameWithFork(fSpec.GetFullPath(), target.GetFullPath(), false);
   fSpec = target;
 }
 
-void File::Delete() { fsimpl::RemoveFile(fSpec.GetFullPath()); }
+void File::Delete() {
+  const UString path = fSpec.GetFullPath();
+  fsimpl::RemoveFile(path);
+  const UString fork = ResourceForkPath(path);
+  if (fsimpl::IsExistingFile(fork)) fsimpl::RemoveFile(fork);
+}
 
 UString File::ResourceForkPath(const UString& path) {
   UString fork = path;

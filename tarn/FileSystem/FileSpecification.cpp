@@ -67,24 +67,6 @@ UString CutUnits(const UString& s, std::size_t count) {
   return s.substr(0, count);
 }
 
-// "base n.ext", cut so that it is at most kMaxNameLength units long. When the
-// extension alone leaves no room, it is treated as part of the base.
-UString UniqueCandidate(const UString& base, const UString& extension, unsigned n) {
-  const UString number(std::to_string(n).c_str());
-  const std::size_t max = FileSpecification::kMaxNameLength;
-  UString b = base;
-  UString ext = extension;
-  if (ext.length() + number.length() + 1 > max) {
-    b += ext;
-    ext.clear();
-  }
-  UString candidate = CutUnits(b, max - ext.length() - number.length() - 1);
-  candidate += ' ';
-  candidate += number;
-  candidate += ext;
-  return candidate;
-}
-
 }  // namespace
 
 FileSpecification::FileSpecification() : fImpl(std::make_unique<Impl>(UString())) {}
@@ -209,6 +191,23 @@ bool FileSpecification::IsApplication() const {
          IsFile();
 }
 
+UString FileSpecification::MakeUniqueCandidate(const UString& base, const UString& extension,
+                                               unsigned n) {
+  const UString number(std::to_string(n).c_str());
+  const std::size_t max = kMaxNameLength;
+  UString b = base;
+  UString ext = extension;
+  if (ext.length() + number.length() + 1 > max) {
+    b += ext;
+    ext.clear();
+  }
+  UString candidate = CutUnits(b, max - ext.length() - number.length() - 1);
+  candidate += ' ';
+  candidate += number;
+  candidate += ext;
+  return candidate;
+}
+
 void FileSpecification::MakeUnique(MakeUniqueMode mode) {
   MakeUniqueAddingExtension(UString(), mode);
 }
@@ -230,7 +229,7 @@ void FileSpecification::MakeUniqueAddingExtension(const UString& extension, Make
   if (NameIsFree(Get().fPath, mode)) return;
   const UString folder = GetParentFolder().Get().fPath;
   for (unsigned n = 2;; ++n) {
-    UString candidate = UniqueCandidate(base, ext, n);
+    UString candidate = MakeUniqueCandidate(base, ext, n);
     if (NameIsFree(Join(folder, candidate), mode)) {
       SetName(candidate);
       return;

@@ -86,6 +86,12 @@ class FileSpecification {
   void MakeUnique(MakeUniqueMode mode = kMakeUniqueAnything);
   void MakeUniqueAddingExtension(const UString& extension,
                                  MakeUniqueMode mode = kMakeUniqueAnything);
+  // The n-th name MakeUnique tries: base, a space, n, extension, with the
+  // base cut (never inside a surrogate pair) so that the result has at most
+  // kMaxNameLength units. An extension too long to leave room is cut as
+  // part of the base instead.
+  [[nodiscard]] static UString MakeUniqueCandidate(const UString& base, const UString& extension,
+                                                   unsigned n);
 
   class Impl;
 

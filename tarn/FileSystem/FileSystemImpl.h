@@ -25,10 +25,13 @@ enum class PathKind { kNone, kFile, kFolder, kOther };
 
 // Queries; never throw.
 [[nodiscard]] PathKind GetPathKind(const UString& path) noexcept;
+// Whether a file (or a file's stream) can be opened at the path.
+[[nodiscard]] bool IsExistingFile(const UString& path) noexcept;
 
-// The resource fork of the file at a path is at the path plus this suffix
-// (an alternate data stream on Windows, a file of its own on POSIX, which the
-// POSIX renames and deletes carry along).
+// The resource fork of the file at a path is at the path plus this suffix:
+// an alternate data stream on Windows (which travels with its file), a file of
+// its own on POSIX and on file systems without streams (which File carries
+// along when it renames or deletes).
 inline constexpr char kResourceForkSuffix[] = ":AFP_Resource";
 
 // Operations; each throws the system's error as a TarnError (kind "Windows"

@@ -18,8 +18,6 @@ namespace {
 
 std::string Native(const UString& path) { return path.utf8_str(); }
 
-std::string NativeFork(const UString& path) { return Native(path) + kResourceForkSuffix; }
-
 // Throws errno (as left by the failed call) with the path(s) attached.
 [[noreturn]] void FailErrno(int err, const char* operation, const UString& path,
                             const UString* path2 = nullptr) {
@@ -31,22 +29,6 @@ std::string NativeFork(const UString& path) { return Native(path) + kResourceFor
   }
   error.SetAttachment(attachment);
   throw error;
-}
-
-bool NativeExists(const std::string& path) {
-  struct stat st;
-  return ::lstat(path.c_str(), &st) == 0;
-}
-
-// Carries the resource fork of `from` along to `to`: renamed over any stale
-// fork at `to`, or, when `from` has none, any fork at `to` is removed.
-void MoveFork(const UString& from, const UString& to) {
-  const std::string fromFork = NativeFork(from), toFork = NativeFork(to);
-  if (NativeExists(fromFork)) {
-    if (::rename(fromFork.c_str(), toFork.c_str()) != 0) FailErrno(errno, "rename", from, &to);
-  } else {
-    ::unlink(toFork.c_str());
-  }
 }
 
 }  // namespace
@@ -73,6 +55,8 @@ PathKind GetPathKind(const UString& path) noexcept {
   if (S_ISDIR(st.st_mode)) return PathKind::kFolder;
   return PathKind::kOther;
 }
+
+bool IsExistingFile(const UString& path) noexcept { return GetPathKind(path) == PathKind::kFile; }
 
 void CreateNewFile(const UString& path) {
   const int fd = ::open(Native(path).c_str(), O_CREAT | O_EXCL | O_RDONLY | O_CLOEXEC, 0666);
@@ -102,21 +86,19 @@ void RenameNoReplace(const UString& from, const UString& to) {
     int err = errno;
     if (err != EINVAL && err != ENOSYS) FailErrno(err, "rename", from, &to);
     // The file system cannot refuse to replace: check, then rename.
-    if (NativeExists(t)) FailErrno(EEXIST, "rename", from, &to);
+    struct stat st;
+    if (::lstat(t.c_str(), &st) == 0) FailErrno(EEXIST, "rename", from, &to);
     if (::rename(f.c_str(), t.c_str()) != 0) FailErrno(errno, "rename", from, &to);
   }
-  MoveFork(from, to);
 }
 
 void RenameReplacing(const UString& from, const UString& to) {
   if (::rename(Native(from).c_str(), Native(to).c_str()) != 0)
     FailErrno(errno, "rename", from, &to);
-  MoveFork(from, to);
 }
 
 void RemoveFile(const UString& path) {
   if (::unlink(Native(path).c_str()) != 0) FailErrno(errno, "delete", path);
-  ::unlink(NativeFork(path).c_str());
 }
 
 FileDate GetModificationDate(const UString& path) {
