@@ -209,7 +209,7 @@ TEST(PtrStream, IgnoresWhatDoesNotFit) {
 
 TEST(PtrStream, GetThruNStopsAtTerminatorOrData) {
   const char text[] = {'a', 'b', '\r', 'c', 'd'};
-  PtrStream s(static_cast<const void*>(text), 5);
+  PtrStream s(PtrStream::ReadOnly{}, text, 5);
   char buf[8] = {};
   EXPECT_EQ(s.GetThruN(buf, '\r', 8), 3);
   EXPECT_EQ(s.GetThruN(buf, '\r', 1), 1);
