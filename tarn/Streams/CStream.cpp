@@ -1,5 +1,6 @@
 #include "tarn/Streams/CStream.h"
 
+#include <climits>
 #include <cstdio>
 #include <cstring>
 #include <string>
@@ -119,7 +120,9 @@ void CStream::PutHandle(char** handle) {
     PutLong(0);
     return;
   }
-  const int size = static_cast<int>(GetHandleSize(handle));
+  const std::size_t bytes = GetHandleSize(handle);
+  if (bytes > static_cast<std::size_t>(INT_MAX)) Failure(-50);  // no 32-bit count holds it
+  const int size = static_cast<int>(bytes);
   PutLong(size);
   PutHandleOfSize(handle, size);
 }
