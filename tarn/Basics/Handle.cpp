@@ -1,5 +1,6 @@
 #include "tarn/Basics/Handle.h"
 
+#include <cstdint>
 #include <cstring>
 #include <new>
 #include <type_traits>
@@ -22,7 +23,12 @@ static_assert(std::is_standard_layout_v<MasterBlock>);
 
 MasterBlock* BlockOf(Handle h) noexcept { return reinterpret_cast<MasterBlock*>(h); }
 
+// No address space holds more; refusing up front keeps such requests away
+// from allocators that abort rather than fail.
+constexpr std::size_t kMaxHandleSize = static_cast<std::size_t>(PTRDIFF_MAX) / 4;
+
 char* AllocateZeroed(std::size_t size) {
+  if (size > kMaxHandleSize) FailMemFullError();
   // At least one byte, so that an empty block still has a distinct address.
   char* p = new (std::nothrow) char[size ? size : 1];
   if (!p) FailMemFullError();

@@ -5,6 +5,9 @@
 #include "tarn/Errors/TarnError.h"
 
 namespace tarn {
+namespace {
+constexpr int kNotOpen = -38;
+}
 
 CBufferedStream::~CBufferedStream() { ReleaseBuffer(); }
 
@@ -63,6 +66,7 @@ void CBufferedStream::GetRawDataFromStream(void* buffer, int count) {
     bufferPosition_ += count > 0 ? count : 0;
     return;
   }
+  if (!buffer_) Failure(kNotOpen);
   while (count > 0) {
     if (bufferPosition_ == bufferLength_) Fill();
     const int available = bufferLength_ - bufferPosition_;
@@ -75,6 +79,7 @@ void CBufferedStream::GetRawDataFromStream(void* buffer, int count) {
 }
 
 void CBufferedStream::PutRawDataToStream(const void* data, int count) {
+  if (!buffer_) Failure(kNotOpen);
   const auto* in = static_cast<const char*>(data);
   while (count > 0) {
     if (bufferPosition_ == bufferSize_) Drain();
@@ -97,6 +102,7 @@ void CBufferedStream::PutThru(const void* data, char terminator) {
 }
 
 int CBufferedStream::GetThruN(void* buffer, char terminator, int max) {
+  if (!buffer_) Failure(kNotOpen);
   auto* out = static_cast<char*>(buffer);
   int count = 0;
   while (count < max) {

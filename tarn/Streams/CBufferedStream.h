@@ -8,7 +8,8 @@
 // buffer back and move past it), Bracket (re-centre the buffer on a position),
 // GetPhysicalSize and SetPhysicalSize. Reading past the end of the data fails
 // with -39; MoveTo outside [0, Size()] fails with FailStream(6); a buffer that
-// cannot be allocated fails with -108. Dirty bytes reach the store on Drain,
+// cannot be allocated fails with -108; reading or writing a stream that was
+// never opened fails with -38. Dirty bytes reach the store on Drain,
 // on a move outside the buffer, on Truncate and on Close.
 //
 // Invariant: 0 <= position <= length <= size of the buffer.

@@ -1,5 +1,6 @@
 #include "tarn/Streams/CStream.h"
 
+#include <climits>
 #include <cstdio>
 #include <cstring>
 #include <string>
@@ -119,7 +120,9 @@ void CStream::PutHandle(char** handle) {
     PutLong(0);
     return;
   }
-  const int size = static_cast<int>(GetHandleSize(handle));
+  const std::size_t bytes = GetHandleSize(handle);
+  if (bytes > static_cast<std::size_t>(INT_MAX)) Failure(-50);  // no 32-bit count holds it
+  const int size = static_cast<int>(bytes);
   PutLong(size);
   PutHandleOfSize(handle, size);
 }
@@ -223,11 +226,24 @@ double CStream::GetIEEEDouble() { return GetBigEndian<double>(*this); }
 void CStream::GetUString(UString& s) {
   const int stored = GetLong();
   const int count = stored < 0 ? 0 : (stored > kMaxUStringBytes ? kMaxUStringBytes : stored);
-  const std::int64_t start = Position();
-  std::string utf8(static_cast<std::size_t>(count), '\0');
-  GetRawDataFromStream(utf8.data(), count);
-  if (stored > count) MoveTo(start + stored);
-  s = UString(utf8.data(), utf8.size(), UString::kUTF8Encoding);
+  // Short texts, the common case, go through the stack.
+  char small[256];
+  std::string large;
+  char* bytes = small;
+  if (count > static_cast<int>(sizeof small)) {
+    large.assign(static_cast<std::size_t>(count), '\0');
+    bytes = large.data();
+  } else {
+    std::memset(small, 0, static_cast<std::size_t>(count));
+  }
+  if (stored > count) {
+    const std::int64_t start = Position();
+    GetRawDataFromStream(bytes, count);
+    MoveTo(start + stored);
+  } else {
+    GetRawDataFromStream(bytes, count);
+  }
+  s.assign(bytes, static_cast<std::size_t>(count), UString::kUTF8Encoding);
 }
 
 void* CStream::GetPointer() {

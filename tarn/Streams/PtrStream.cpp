@@ -10,7 +10,7 @@ PtrStream::PtrStream(void* base, std::int64_t capacity, std::int64_t size) noexc
       size_(size < 0 ? 0 : (size > capacity_ ? capacity_ : size)) {}
 
 // Capacity 0: nothing is ever written through the const area.
-PtrStream::PtrStream(const void* base, std::int64_t size) noexcept
+PtrStream::PtrStream(ReadOnly, const void* base, std::int64_t size) noexcept
     : base_(static_cast<char*>(const_cast<void*>(base))),
       capacity_(0),
       size_(size > 0 ? size : 0) {}

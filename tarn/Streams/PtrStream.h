@@ -18,8 +18,9 @@ class PtrStream : public CStream {
  public:
   // A writable area of `capacity` bytes whose first `size` bytes hold data.
   PtrStream(void* base, std::int64_t capacity, std::int64_t size = 0) noexcept;
-  // A read-only area of `size` bytes of data.
-  PtrStream(const void* base, std::int64_t size) noexcept;
+  // A read-only area of `size` bytes of data (capacity 0: writes are ignored).
+  struct ReadOnly {};
+  PtrStream(ReadOnly, const void* base, std::int64_t size) noexcept;
   PtrStream(const PtrStream&) = delete;
   PtrStream& operator=(const PtrStream&) = delete;
   ~PtrStream() override = default;

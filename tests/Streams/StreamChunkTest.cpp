@@ -206,10 +206,10 @@ TEST(UStringIO, ReadsBack) {
 
   // A field whose length byte lies is cut to the field.
   const unsigned char field[] = {200, 'a', 'b'};
-  PtrStream p(static_cast<const void*>(field), 3);
+  PtrStream p(PtrStream::ReadOnly{}, field, 3);
   GetFixedSizeUCharArrayAsUString(p, 3, back);
   EXPECT_EQ(back.utf8_str(), "ab");
-  PtrStream u(static_cast<const void*>(field + 1), 2);
+  PtrStream u(PtrStream::ReadOnly{}, field + 1, 2);
   GetUCharArrayAsUString(u, 2, back);
   EXPECT_EQ(back.utf8_str(), "ab");
 }

@@ -59,6 +59,17 @@ TEST(CFileStream, MissingFileFailsToOpenWith5000) {
   EXPECT_EQ(CodeOf([&] { s.Open(kTCLReadWriteMode); }), -5000);
 }
 
+TEST(CFileStream, UnopenedStreamsFailInsteadOfTouchingMemory) {
+  TempPath path("unopened");
+  CFileStream file(path.Spec());
+  EXPECT_EQ(CodeOf([&] { file.PutLong(1); }), -38);
+  EXPECT_EQ(CodeOf([&] { (void)file.GetLong(); }), -38);
+  CHandleStream handle;
+  EXPECT_EQ(CodeOf([&] { handle.PutLong(1); }), -38);
+  char text[4];
+  EXPECT_EQ(CodeOf([&] { handle.GetStr(text, 4); }), -38);
+}
+
 TEST(CFileStream, ReadWriteEditsInPlaceAcrossBuffers) {
   TempPath path("edit");
   {
@@ -198,7 +209,7 @@ TEST(PtrStream, IgnoresWhatDoesNotFit) {
 
 TEST(PtrStream, GetThruNStopsAtTerminatorOrData) {
   const char text[] = {'a', 'b', '\r', 'c', 'd'};
-  PtrStream s(static_cast<const void*>(text), 5);
+  PtrStream s(PtrStream::ReadOnly{}, text, 5);
   char buf[8] = {};
   EXPECT_EQ(s.GetThruN(buf, '\r', 8), 3);
   EXPECT_EQ(s.GetThruN(buf, '\r', 1), 1);

@@ -214,7 +214,7 @@ TEST(Truncation, PtrStreamCutsReadZerosInsideTheArea) {
   const Bytes image = test::ImageOf(WriteRecord);
   for (std::size_t cut = 0; cut < image.size(); ++cut) {
     std::vector<char> exact(image.begin(), image.begin() + static_cast<std::ptrdiff_t>(cut));
-    PtrStream s(static_cast<const void*>(exact.data()), static_cast<std::int64_t>(cut));
+    PtrStream s(PtrStream::ReadOnly{}, exact.data(), static_cast<std::int64_t>(cut));
     try {
       ::testing::TestPartResultArray ignored;
       ::testing::ScopedFakeTestPartResultReporter quiet(

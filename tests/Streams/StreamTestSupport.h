@@ -114,7 +114,7 @@ class PtrChannel : public Channel {
       : memory_(1 << 20), out_(memory_.data(), static_cast<std::int64_t>(memory_.size())) {}
   CStream& Out() override { return out_; }
   CStream& In() override {
-    in_ = std::make_unique<PtrStream>(static_cast<const void*>(memory_.data()), out_.Size());
+    in_ = std::make_unique<PtrStream>(PtrStream::ReadOnly{}, memory_.data(), out_.Size());
     return *in_;
   }
 
