@@ -191,7 +191,8 @@ TEST(ExceptionThrower, ThrowsTheHeldErrorOnlyWhenTheCodeIsSet) {
   EXPECT_FALSE(Thrown([] { ExceptionThrower quiet("f.cpp", 3); }));
   const auto e = Thrown([] {
     ExceptionThrower thrower("Streams/CFileStream.cpp", 41);
-    static_cast<TarnError&>(thrower).SetIntErrorCode(-36);
+    TarnError& error = thrower;
+    error = -36;  // keeps the source location
   });
   ASSERT_TRUE(e);
   ExpectFields(*e, "OS", "", "", -36, "Streams/CFileStream.cpp 41");
