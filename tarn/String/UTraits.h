@@ -1,6 +1,6 @@
 // Character traits for the library's UTF-16 and UTF-32 code-unit strings.
 //
-// std::char_traits is only specified for the standard character types, so the
+// std::char_traits is only provided for the standard character types, so the
 // string storage of UString (unsigned short units) and its UTF-32 form
 // (unsigned int units) use these traits instead. Ordering is plain code-unit
 // value order.
