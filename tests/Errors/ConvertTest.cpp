@@ -120,7 +120,7 @@ TEST(ConvertUnpacking, PlainRecordsBecomePavKinds) {
   r.kind = -7;
   const TarnError odd = Convert(r);
   EXPECT_EQ(odd.GetKind(), "Pav,-7");
-  EXPECT_EQ(Convert(odd).kind, -7);
+  EXPECT_EQ(int32_t{Convert(odd).kind}, -7);
   EXPECT_FALSE(IsPackedTarnException(TarnError(-43)));
   EXPECT_FALSE(IsPackedTarnInternalErr(TarnError(0)));
 }
@@ -141,7 +141,7 @@ TEST(ConvertDetailedMessage, AttachmentTravelsAsTheDetailedMessage) {
   const UString paths("/Volumes/Audio/Take 1.wav\n/Volumes/Audio/Take 1 copy.wav \xC3\xA9");
   const TarnError e("OS", "File I/O", "", -48, "ignored once detailed", paths);
   const TarnException r = Convert(e);
-  EXPECT_NE(r.reserved, 0);
+  EXPECT_NE(int32_t{r.reserved}, 0);
   char buffer[256];
   ASSERT_TRUE(TPOGetDetailedErrorMessage(&r, buffer, sizeof buffer));
   EXPECT_EQ(std::string(buffer), paths.utf8_str());
@@ -191,7 +191,8 @@ TEST(ExceptionThrower, ThrowsTheHeldErrorOnlyWhenTheCodeIsSet) {
   EXPECT_FALSE(Thrown([] { ExceptionThrower quiet("f.cpp", 3); }));
   const auto e = Thrown([] {
     ExceptionThrower thrower("Streams/CFileStream.cpp", 41);
-    static_cast<TarnError&>(thrower).SetIntErrorCode(-36);
+    TarnError& error = thrower;
+    error = -36;  // keeps the source location
   });
   ASSERT_TRUE(e);
   ExpectFields(*e, "OS", "", "", -36, "Streams/CFileStream.cpp 41");

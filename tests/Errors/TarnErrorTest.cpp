@@ -76,12 +76,34 @@ TEST(TarnErrorMacOSCode, ForeignKindsNeverBecomeNoErrorOrCancel) {
   EXPECT_EQ(TarnError("os", "", "", 0).GetMacOSErrorCode(), -128);
 }
 
+TEST(TarnErrorMacOSCode, NoForeignCodeMapsToNoErrorOrCancelAcrossAllLowHalves) {
+  // Every 16-bit pattern, with a few different high halves.
+  for (int high : {0, 1, -1, 0x7FFF, -0x8000}) {
+    for (int low = 0; low <= 0xFFFF; ++low) {
+      const int code =
+          static_cast<int>(static_cast<uint32_t>(high) << 16 | static_cast<uint32_t>(low));
+      const short os = TarnError(code).GetMacOSErrorCode();
+      const short foreign = TarnError("COM", "", "", code).GetMacOSErrorCode();
+      ASSERT_EQ(static_cast<uint16_t>(os), low) << code;
+      if (code == 0)
+        ASSERT_EQ(foreign, -128);
+      else if (low == 0 || low == 0xFF80)
+        ASSERT_EQ(foreign, 32767) << code;
+      else
+        ASSERT_EQ(foreign, os) << code;
+    }
+  }
+}
+
 TEST(TarnErrorMacOSCode, ProxyConvertsToIntAndShort) {
   TarnError e("COM", "COM", "COM", 0x10000);
   int asInt = e.GetErrorCode();
   short asShort = e.GetErrorCode();
   EXPECT_EQ(asInt, 0x10000);
   EXPECT_EQ(asShort, 32767);
+  EXPECT_TRUE(e.GetErrorCode() == 0x10000);
+  EXPECT_TRUE(e.GetErrorCode() != 32767);
+  EXPECT_TRUE(0x10000 == e.GetErrorCode());
 }
 
 TEST(TarnErrorQueries, MacOSAndFileSystemErrors) {

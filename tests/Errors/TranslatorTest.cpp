@@ -1,6 +1,9 @@
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <string>
+#include <thread>
+#include <vector>
 
 #include "tarn/Basics/TarnCoreLibCallbacks.h"
 #include "tarn/Errors/TarnError.h"
@@ -184,6 +187,27 @@ TEST(TarnCoreLibCallbacks, HostTextsFirstThenBuiltIns) {
   }
   EXPECT_NE(TarnCoreLibCallbacks::GetCallbackAPI(), &host);
   EXPECT_EQ(GetIndUString(kGeneralLabelsStringList, kAttachmentLabelIndex).utf8_str(), "Files:");
+}
+
+TEST(TarnCoreLibCallbacks, InstallingWhileOtherThreadsReadTexts) {
+  TestHost host;
+  std::atomic<bool> stop{false};
+  std::atomic<int> wrong{0};
+  std::vector<std::thread> readers;
+  for (int t = 0; t < 3; ++t) {
+    readers.emplace_back([&] {
+      while (!stop.load()) {
+        const std::string label =
+            GetIndUString(kGeneralLabelsStringList, kAttachmentLabelIndex).utf8_str();
+        if (label != "Files:" && label != "Dateien:") ++wrong;
+      }
+    });
+  }
+  for (int i = 0; i < 2000; ++i) TarnCoreLibCallbacks::SetCallbackAPI(i % 2 ? nullptr : &host);
+  TarnCoreLibCallbacks::SetCallbackAPI(nullptr);
+  stop = true;
+  for (auto& r : readers) r.join();
+  EXPECT_EQ(wrong.load(), 0);
 }
 
 TEST(DefaultTranslator, DescribesAnyErrorOnOneLine) {
