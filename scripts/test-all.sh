@@ -24,6 +24,7 @@ run_preset() {
   fi
   ctest --preset "$p" -j "$jobs"
   if [ "$p" = default ]; then
+    scripts/check-umbrella.sh
     scripts/check-install.sh build/default
   fi
 }
