@@ -1,0 +1,138 @@
+#include "tarn/Threads/CircularBuffer.h"
+
+#include <cstring>
+#include <new>
+
+#include "tarn/Errors/TarnError.h"
+
+namespace tarn {
+
+CircularBuffer::ReadTransaction::ReadTransaction(const CircularBuffer& buffer) noexcept
+    : fWorking(buffer.fRead.load(std::memory_order_relaxed)), fSaved(fWorking) {}
+
+CircularBuffer::WriteTransaction::WriteTransaction(const CircularBuffer& buffer) noexcept
+    : fWorking(buffer.fWrite.load(std::memory_order_relaxed)), fSaved(fWorking) {}
+
+CircularBuffer::CircularBuffer(int32_t recordSize, int16_t capacity)
+    : fStart(nullptr), fEnd(nullptr), fRecordSize(recordSize), fOwnsStorage(true) {
+  // One slot always stays empty; the slot count is a 16-bit quantity.
+  const auto slots = static_cast<int16_t>(capacity + 1);
+  if (recordSize < 1 || slots < 1) FailOSErr(-50);
+  const std::size_t bytes = static_cast<std::size_t>(recordSize) * static_cast<std::size_t>(slots);
+  fStart = new (std::nothrow) char[bytes];
+  if (fStart == nullptr) FailMemFullError();
+  std::memset(fStart, 0, bytes);
+  fEnd = fStart + bytes;
+  fWrite.store(fStart, std::memory_order_relaxed);
+  fRead.store(fStart, std::memory_order_relaxed);
+  fReadSeenByProducer = fStart;
+  fWriteSeenByConsumer = fStart;
+}
+
+CircularBuffer::CircularBuffer(const CircularBuffer& other) noexcept
+    : fStart(other.fStart),
+      fEnd(other.fEnd),
+      fRecordSize(other.fRecordSize),
+      fOwnsStorage(false),
+      fWrite(other.fWrite.load(std::memory_order_acquire)),
+      fReadSeenByProducer(other.fStart),
+      fRead(other.fRead.load(std::memory_order_acquire)),
+      fWriteSeenByConsumer(other.fStart) {
+  fReadSeenByProducer = fRead.load(std::memory_order_relaxed);
+  fWriteSeenByConsumer = fWrite.load(std::memory_order_relaxed);
+}
+
+CircularBuffer::~CircularBuffer() {
+  if (fOwnsStorage) delete[] fStart;
+}
+
+int32_t CircularBuffer::GetCapacity() const noexcept {
+  return static_cast<int32_t>((fEnd - fStart) / fRecordSize) - 1;
+}
+
+bool CircularBuffer::CanWrite(const WriteTransaction& t) noexcept {
+  char* next = BumpPtr(t.fWorking);
+  if (next != fReadSeenByProducer) return true;
+  fReadSeenByProducer = fRead.load(std::memory_order_acquire);
+  return next != fReadSeenByProducer;
+}
+
+bool CircularBuffer::CanRead(const ReadTransaction& t) noexcept {
+  if (t.fWorking != fWriteSeenByConsumer) return true;
+  fWriteSeenByConsumer = fWrite.load(std::memory_order_acquire);
+  return t.fWorking != fWriteSeenByConsumer;
+}
+
+void CircularBuffer::WriteImplementation(WriteTransaction& t, const void* source) noexcept {
+  std::memcpy(t.fWorking, source, static_cast<std::size_t>(fRecordSize));
+  t.fWorking = BumpPtr(t.fWorking);
+}
+
+void CircularBuffer::ReadImplementation(ReadTransaction& t, void* destination) noexcept {
+  std::memcpy(destination, t.fWorking, static_cast<std::size_t>(fRecordSize));
+  t.fWorking = BumpPtr(t.fWorking);
+}
+
+bool CircularBuffer::Write(WriteTransaction& t, const void* source) noexcept {
+  TARN_ASSERT(t.fWorking >= fStart && t.fWorking < fEnd);
+  if (!CanWrite(t)) return false;
+  WriteImplementation(t, source);
+  return true;
+}
+
+bool CircularBuffer::Read(ReadTransaction& t, void* destination) noexcept {
+  TARN_ASSERT(t.fWorking >= fStart && t.fWorking < fEnd);
+  if (!CanRead(t)) return false;
+  ReadImplementation(t, destination);
+  return true;
+}
+
+const void* CircularBuffer::Snoop(ReadTransaction& t) noexcept {
+  if (!CanRead(t)) return nullptr;
+  const char* record = t.fWorking;
+  t.fWorking = BumpPtr(t.fWorking);
+  return record;
+}
+
+void CircularBuffer::Commit(WriteTransaction& t) noexcept {
+  TARN_ASSERT((t.fWorking - fStart) % fRecordSize == 0);
+  fWrite.store(t.fWorking, std::memory_order_release);
+  t.fSaved = t.fWorking;
+}
+
+void CircularBuffer::Commit(ReadTransaction& t) noexcept {
+  TARN_ASSERT((t.fWorking - fStart) % fRecordSize == 0);
+  fRead.store(t.fWorking, std::memory_order_release);
+  t.fSaved = t.fWorking;
+}
+
+bool CircularBuffer::IsEmpty() const noexcept {
+  return fRead.load(std::memory_order_acquire) == fWrite.load(std::memory_order_acquire);
+}
+
+bool CircularBuffer::IsFull() const noexcept {
+  return BumpPtr(fWrite.load(std::memory_order_relaxed)) == fRead.load(std::memory_order_acquire);
+}
+
+void CircularBuffer::SetEmpty() noexcept {
+  fWriteSeenByConsumer = fWrite.load(std::memory_order_acquire);
+  fRead.store(fWriteSeenByConsumer, std::memory_order_release);
+}
+
+std::unique_ptr<CircularBuffer> CircularBuffer::CopyAndResize(int16_t newCapacity) {
+  auto copy = std::make_unique<CircularBuffer>(fRecordSize, newCapacity);
+  std::unique_ptr<char[]> scratch(new (std::nothrow) char[static_cast<std::size_t>(fRecordSize)]);
+  if (!scratch) return nullptr;
+
+  ReadTransaction from(*this);
+  WriteTransaction to(*copy);
+  while (Read(from, scratch.get())) {
+    // The record just taken out is dropped when the new buffer is full.
+    if (!copy->Write(to, scratch.get())) break;
+  }
+  copy->Commit(to);
+  Commit(from);
+  return copy;
+}
+
+}  // namespace tarn
