@@ -3,7 +3,8 @@
 #include <cstring>
 #include <new>
 
-#include "tarn/Errors/TarnError.h"
+#include "tarn/Errors/Fail.h"
+#include "tarn/Errors/TarnAssert.h"
 
 namespace tarn {
 
@@ -27,6 +28,7 @@ CircularBuffer::CircularBuffer(int32_t recordSize, int16_t capacity)
   fRead.store(fStart, std::memory_order_relaxed);
   fReadSeenByProducer = fStart;
   fWriteSeenByConsumer = fStart;
+  AssertInvariants();
 }
 
 CircularBuffer::CircularBuffer(const CircularBuffer& other) noexcept
@@ -44,6 +46,14 @@ CircularBuffer::CircularBuffer(const CircularBuffer& other) noexcept
 
 CircularBuffer::~CircularBuffer() {
   if (fOwnsStorage) delete[] fStart;
+}
+
+void CircularBuffer::AssertInvariants() const noexcept {
+  const char* read = fRead.load(std::memory_order_acquire);
+  const char* write = fWrite.load(std::memory_order_acquire);
+  TARN_ASSERT(fStart < fEnd && (fEnd - fStart) % fRecordSize == 0);
+  TARN_ASSERT(read >= fStart && read < fEnd && (read - fStart) % fRecordSize == 0);
+  TARN_ASSERT(write >= fStart && write < fEnd && (write - fStart) % fRecordSize == 0);
 }
 
 int32_t CircularBuffer::GetCapacity() const noexcept {
@@ -74,14 +84,12 @@ void CircularBuffer::ReadImplementation(ReadTransaction& t, void* destination) n
 }
 
 bool CircularBuffer::Write(WriteTransaction& t, const void* source) noexcept {
-  TARN_ASSERT(t.fWorking >= fStart && t.fWorking < fEnd);
   if (!CanWrite(t)) return false;
   WriteImplementation(t, source);
   return true;
 }
 
 bool CircularBuffer::Read(ReadTransaction& t, void* destination) noexcept {
-  TARN_ASSERT(t.fWorking >= fStart && t.fWorking < fEnd);
   if (!CanRead(t)) return false;
   ReadImplementation(t, destination);
   return true;
@@ -95,13 +103,13 @@ const void* CircularBuffer::Snoop(ReadTransaction& t) noexcept {
 }
 
 void CircularBuffer::Commit(WriteTransaction& t) noexcept {
-  TARN_ASSERT((t.fWorking - fStart) % fRecordSize == 0);
+  TARN_ASSERT(t.fWorking >= fStart && t.fWorking < fEnd);
   fWrite.store(t.fWorking, std::memory_order_release);
   t.fSaved = t.fWorking;
 }
 
 void CircularBuffer::Commit(ReadTransaction& t) noexcept {
-  TARN_ASSERT((t.fWorking - fStart) % fRecordSize == 0);
+  TARN_ASSERT(t.fWorking >= fStart && t.fWorking < fEnd);
   fRead.store(t.fWorking, std::memory_order_release);
   t.fSaved = t.fWorking;
 }
@@ -132,6 +140,8 @@ std::unique_ptr<CircularBuffer> CircularBuffer::CopyAndResize(int16_t newCapacit
   }
   copy->Commit(to);
   Commit(from);
+  AssertInvariants();
+  copy->AssertInvariants();
   return copy;
 }
 

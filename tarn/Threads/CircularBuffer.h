@@ -110,6 +110,10 @@ class alignas(64) CircularBuffer {
  private:
   static constexpr std::size_t kLine = 64;
 
+  // Checks the invariants below (off the hot paths: commits check only that
+  // the published pointer lies inside the storage).
+  void AssertInvariants() const noexcept;
+
   // Invariants (n = (fEnd - fStart) / fRecordSize slots, capacity = n - 1):
   //   fStart <= fRead, fWrite < fEnd and both are multiples of fRecordSize
   //   from fStart; readable = (fWrite - fRead) mod (n * fRecordSize)

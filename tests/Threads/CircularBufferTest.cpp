@@ -10,7 +10,7 @@
 #include <thread>
 #include <vector>
 
-#include "tarn/Errors/TarnError.h"
+#include "tarn/Errors/Fail.h"
 
 namespace tarn {
 namespace {
