@@ -1,0 +1,48 @@
+// The portable parts of TarnThreadID: the exception handler slot and the
+// per-thread semaphores.
+#include "tarn/Threads/TarnThreadID.h"
+
+#include <atomic>
+#include <mutex>
+#include <new>
+
+#include "tarn/Threads/TarnSemaphore.h"
+
+namespace tarn {
+
+namespace {
+
+std::atomic<TarnThreadID::ExceptionHandler> gExceptionHandler{nullptr};
+
+// Every thread semaphore ever made stays on this list (never freed), so that
+// a semaphore outlives its thread and late signals stay harmless.
+struct RetainedSemaphore {
+  TarnSemaphore semaphore;
+  RetainedSemaphore* next = nullptr;
+};
+std::atomic<RetainedSemaphore*> gRetainedSemaphores{nullptr};
+
+thread_local TarnSemaphore* tThreadSemaphore = nullptr;
+
+}  // namespace
+
+void TarnThreadID::SetExceptionHandler(ExceptionHandler handler) noexcept {
+  gExceptionHandler.store(handler);
+}
+
+TarnThreadID::ExceptionHandler TarnThreadID::GetExceptionHandler() noexcept {
+  return gExceptionHandler.load();
+}
+
+TarnSemaphore& TarnThreadID::DemandThreadSemaphore() {
+  if (tThreadSemaphore == nullptr) {
+    auto* retained = new RetainedSemaphore;
+    retained->next = gRetainedSemaphores.load();
+    while (!gRetainedSemaphores.compare_exchange_weak(retained->next, retained)) {
+    }
+    tThreadSemaphore = &retained->semaphore;
+  }
+  return *tThreadSemaphore;
+}
+
+}  // namespace tarn
