@@ -5,7 +5,6 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <ctime>
 #include <string>
 
 #include "tarn/String/UTraits.h"
@@ -37,7 +36,7 @@ void MapCaseString(UTF16String& s, bool upper);
 UTF16String NormalizeKC(const UTF16String& s);
 
 bool SystemIsRoman();
-// Local broken-down time of a Unix time; false when the platform cannot.
-bool ToLocalTime(std::int64_t unixSeconds, std::tm& out);
+// Local time minus UTC, in seconds, at the given Unix time.
+std::int64_t LocalOffsetSeconds(std::int64_t unixSeconds);
 
 }  // namespace tarn::detail
