@@ -113,7 +113,7 @@ TarnJobThread::TarnJobThread(const UString& name, int32_t flags)
 
 TarnJobThread::TarnJobThread(std::shared_ptr<TarnJobThreadDelegate> delegate, int32_t flags,
                              const UString& name)
-    : fQueue(std::make_shared<TarnJobQueue>((flags & kSignalOnlyWhenEmpty) != 0)),
+    : fQueue(std::make_shared<TarnJobQueue>((flags & kWakeOnlyWhenWaiting) != 0)),
       fRoutine(std::make_shared<Routine>(fQueue, std::move(delegate),
                                          (flags & kRunRemainingJobsAtExit) != 0)),
       fThread(fRoutine, name),

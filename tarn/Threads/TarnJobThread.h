@@ -57,7 +57,7 @@ class TarnJobThread {
  public:
   enum Flags : int32_t {
     kRunRemainingJobsAtExit = 1 << 0,  // else they are cancelled
-    kSignalOnlyWhenEmpty = 1 << 1,     // producers wake the thread only on empty -> non-empty
+    kWakeOnlyWhenWaiting = 1 << 1,     // producers signal only a thread that is waiting
     kDoNotWaitAtTerminate = 1 << 2,    // Terminate from another thread returns at once
   };
   // 0 leaves the priority alone; 1 highest; 2 real-time normal (by the

@@ -39,11 +39,11 @@ class blocking_queue {
  public:
   static constexpr int32_t kBlockSlots = 64;
 
-  // signalOnlyWhenEmpty: producers signal the wake semaphore only when their
-  // item made the queue non-empty (saves a kernel call per item in bursts;
-  // the consumer drains until empty anyway).
-  explicit blocking_queue(bool signalOnlyWhenEmpty = false)
-      : fHead(new Block), fTail(fHead), fSignalOnlyWhenEmpty(signalOnlyWhenEmpty) {}
+  // wakeOnlyWhenWaiting: producers signal the wake semaphore only when the
+  // consumer has announced that it is about to wait (saves a system call per
+  // item while the consumer is busy; the consumer drains until empty anyway).
+  explicit blocking_queue(bool wakeOnlyWhenWaiting = false)
+      : fHead(new Block), fTail(fHead), fWakeOnlyWhenWaiting(wakeOnlyWhenWaiting) {}
   blocking_queue(const blocking_queue&) = delete;
   blocking_queue& operator=(const blocking_queue&) = delete;
   ~blocking_queue() {
@@ -56,35 +56,44 @@ class blocking_queue {
 
   // Appends item; never blocks except on the push mutex.
   void push(T item) {
-    Block* fresh = nullptr;
     fPushMutex.lock();
+    // Counted before it is published, so the consumer never takes an item
+    // that is not yet counted: count >= items visible to the consumer.
+    fCount.fetch_add(1, std::memory_order_seq_cst);
     Block* tail = fTail;
     const int32_t fill = tail->fill.load(std::memory_order_relaxed);
     if (fill < kBlockSlots) {
       tail->slots[fill] = std::move(item);
-      tail->fill.store(fill + 1, std::memory_order_release);
+      tail->fill.store(fill + 1, std::memory_order_seq_cst);
     } else {
       // The item goes into slot 0 before the block is linked, so the consumer
       // never sees an empty successor.
-      fresh = new (std::nothrow) Block;
+      Block* fresh = new (std::nothrow) Block;
       if (fresh == nullptr) {
+        fCount.fetch_sub(1, std::memory_order_seq_cst);
         fPushMutex.unlock();
         FailMemFullError();
       }
       fresh->slots[0] = std::move(item);
       fresh->fill.store(1, std::memory_order_relaxed);
       fTail = fresh;
-      tail->next.store(fresh, std::memory_order_release);  // last touch of the old tail
+      tail->next.store(fresh, std::memory_order_seq_cst);  // last touch of the old tail
     }
-    const int32_t before = fCount.fetch_add(1, std::memory_order_seq_cst);
     fPushMutex.unlock();
-    if (!fSignalOnlyWhenEmpty || before == 0) fWake.Signal();
+    if (fWakeOnlyWhenWaiting) {
+      // The publishing store above, this exchange, the consumer's store of
+      // fWaiting and its second look are all sequentially consistent: either
+      // the consumer sees this item when it looks again, or this producer
+      // sees it waiting.
+      if (!fWaiting.exchange(false, std::memory_order_seq_cst)) return;
+    }
+    fWake.Signal();
   }
 
   // Consumer: takes the oldest item into out; false when the queue is empty.
   bool try_pop(T& out) {
-    if (fHeadIndex >= fHead->fill.load(std::memory_order_acquire)) {
-      Block* next = fHead->next.load(std::memory_order_acquire);
+    if (fHeadIndex >= fHead->fill.load(std::memory_order_seq_cst)) {
+      Block* next = fHead->next.load(std::memory_order_seq_cst);
       if (next == nullptr) return false;
       // A linked successor means the head block is full; its last slots may
       // have been filled since the first look.
@@ -110,6 +119,13 @@ class blocking_queue {
       if (fInterrupted.exchange(false, std::memory_order_acq_rel)) FailBlockingQueueInterrupted();
       T item;
       if (try_pop(item)) return item;
+      if (fWakeOnlyWhenWaiting) {
+        fWaiting.store(true, std::memory_order_seq_cst);
+        if (try_pop(item)) {
+          fWaiting.store(false, std::memory_order_relaxed);
+          return item;
+        }
+      }
       fWake.Wait();
     }
   }
@@ -136,7 +152,8 @@ class blocking_queue {
   };
 
   // Consumer's side. Invariant: count == (slots filled in the chain from
-  // fHead) - fHeadIndex, once every producer has left push().
+  // fHead) - fHeadIndex once every producer has left push(); while one is
+  // inside, count may exceed it by one (counted, not yet published).
   Block* fHead;
   int32_t fHeadIndex = 0;
 
@@ -147,7 +164,8 @@ class blocking_queue {
   std::atomic<int32_t> fCount{0};
   TarnBinarySemaphore fWake{false};
   std::atomic<bool> fInterrupted{false};
-  const bool fSignalOnlyWhenEmpty;
+  std::atomic<bool> fWaiting{false};  // the consumer is about to wait
+  const bool fWakeOnlyWhenWaiting;
 };
 
 }  // namespace tarn

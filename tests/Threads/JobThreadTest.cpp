@@ -100,9 +100,9 @@ TEST(BlockingQueue, InterruptBreaksABlockedWait) {
 }
 
 // Several producers, one consumer; with and without the empty-only signal.
-void ManyProducersOneConsumer(bool signalOnlyWhenEmpty) {
+void ManyProducersOneConsumer(bool wakeOnlyWhenWaiting) {
   constexpr int kProducers = 4, kEach = 20000;
-  blocking_queue<int> q(signalOnlyWhenEmpty);
+  blocking_queue<int> q(wakeOnlyWhenWaiting);
   std::vector<std::thread> producers;
   for (int p = 0; p < kProducers; ++p)
     producers.emplace_back([&q, p] {
@@ -121,7 +121,7 @@ void ManyProducersOneConsumer(bool signalOnlyWhenEmpty) {
 }
 
 TEST(BlockingQueueStress, ProducersKeepTheirOrder) { ManyProducersOneConsumer(false); }
-TEST(BlockingQueueStress, ProducersKeepTheirOrderWithEmptyOnlySignal) {
+TEST(BlockingQueueStress, ProducersKeepTheirOrderWithWakeOnlyWhenWaiting) {
   ManyProducersOneConsumer(true);
 }
 
@@ -327,8 +327,8 @@ void PostWhileTerminating(int32_t flags) {
 }
 
 TEST(TarnJobThreadStress, PostingWhileTerminating) { PostWhileTerminating(0); }
-TEST(TarnJobThreadStress, PostingWhileTerminatingEmptyOnlySignal) {
-  PostWhileTerminating(TarnJobThread::kSignalOnlyWhenEmpty |
+TEST(TarnJobThreadStress, PostingWhileTerminatingWakeOnlyWhenWaiting) {
+  PostWhileTerminating(TarnJobThread::kWakeOnlyWhenWaiting |
                        TarnJobThread::kRunRemainingJobsAtExit);
 }
 
