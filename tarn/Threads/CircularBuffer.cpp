@@ -9,10 +9,14 @@
 namespace tarn {
 
 CircularBuffer::ReadTransaction::ReadTransaction(const CircularBuffer& buffer) noexcept
-    : fWorking(buffer.fRead.load(std::memory_order_relaxed)), fSaved(fWorking) {}
+    : fWorking(buffer.fRead.load(std::memory_order_relaxed)), fSaved(fWorking) {
+  buffer.AssertInvariants();
+}
 
 CircularBuffer::WriteTransaction::WriteTransaction(const CircularBuffer& buffer) noexcept
-    : fWorking(buffer.fWrite.load(std::memory_order_relaxed)), fSaved(fWorking) {}
+    : fWorking(buffer.fWrite.load(std::memory_order_relaxed)), fSaved(fWorking) {
+  buffer.AssertInvariants();
+}
 
 CircularBuffer::CircularBuffer(int32_t recordSize, int16_t capacity)
     : fStart(nullptr), fEnd(nullptr), fRecordSize(recordSize), fOwnsStorage(true) {
@@ -60,60 +64,6 @@ int32_t CircularBuffer::GetCapacity() const noexcept {
   return static_cast<int32_t>((fEnd - fStart) / fRecordSize) - 1;
 }
 
-bool CircularBuffer::CanWrite(const WriteTransaction& t) noexcept {
-  char* next = BumpPtr(t.fWorking);
-  if (next != fReadSeenByProducer) return true;
-  fReadSeenByProducer = fRead.load(std::memory_order_acquire);
-  return next != fReadSeenByProducer;
-}
-
-bool CircularBuffer::CanRead(const ReadTransaction& t) noexcept {
-  if (t.fWorking != fWriteSeenByConsumer) return true;
-  fWriteSeenByConsumer = fWrite.load(std::memory_order_acquire);
-  return t.fWorking != fWriteSeenByConsumer;
-}
-
-void CircularBuffer::WriteImplementation(WriteTransaction& t, const void* source) noexcept {
-  std::memcpy(t.fWorking, source, static_cast<std::size_t>(fRecordSize));
-  t.fWorking = BumpPtr(t.fWorking);
-}
-
-void CircularBuffer::ReadImplementation(ReadTransaction& t, void* destination) noexcept {
-  std::memcpy(destination, t.fWorking, static_cast<std::size_t>(fRecordSize));
-  t.fWorking = BumpPtr(t.fWorking);
-}
-
-bool CircularBuffer::Write(WriteTransaction& t, const void* source) noexcept {
-  if (!CanWrite(t)) return false;
-  WriteImplementation(t, source);
-  return true;
-}
-
-bool CircularBuffer::Read(ReadTransaction& t, void* destination) noexcept {
-  if (!CanRead(t)) return false;
-  ReadImplementation(t, destination);
-  return true;
-}
-
-const void* CircularBuffer::Snoop(ReadTransaction& t) noexcept {
-  if (!CanRead(t)) return nullptr;
-  const char* record = t.fWorking;
-  t.fWorking = BumpPtr(t.fWorking);
-  return record;
-}
-
-void CircularBuffer::Commit(WriteTransaction& t) noexcept {
-  TARN_ASSERT(t.fWorking >= fStart && t.fWorking < fEnd);
-  fWrite.store(t.fWorking, std::memory_order_release);
-  t.fSaved = t.fWorking;
-}
-
-void CircularBuffer::Commit(ReadTransaction& t) noexcept {
-  TARN_ASSERT(t.fWorking >= fStart && t.fWorking < fEnd);
-  fRead.store(t.fWorking, std::memory_order_release);
-  t.fSaved = t.fWorking;
-}
-
 bool CircularBuffer::IsEmpty() const noexcept {
   return fRead.load(std::memory_order_acquire) == fWrite.load(std::memory_order_acquire);
 }
@@ -125,6 +75,7 @@ bool CircularBuffer::IsFull() const noexcept {
 void CircularBuffer::SetEmpty() noexcept {
   fWriteSeenByConsumer = fWrite.load(std::memory_order_acquire);
   fRead.store(fWriteSeenByConsumer, std::memory_order_release);
+  AssertInvariants();
 }
 
 std::unique_ptr<CircularBuffer> CircularBuffer::CopyAndResize(int16_t newCapacity) {

@@ -22,7 +22,11 @@
 
 #include <atomic>
 #include <cstdint>
+#include <cstring>
 #include <memory>
+#include <type_traits>
+
+#include "tarn/Errors/TarnAssert.h"
 
 namespace tarn {
 
@@ -68,16 +72,66 @@ class alignas(64) CircularBuffer {
 
   // Producer: false when full; else copies one record from source into the
   // transaction's working slot and advances it.
-  bool Write(WriteTransaction& t, const void* source) noexcept;
+  bool Write(WriteTransaction& t, const void* source) noexcept {
+    char* const at = t.fWorking;
+    char* const next = BumpPtr(at);
+    if (!HasRoomBefore(next)) return false;
+    CopyRecord(at, source);
+    t.fWorking = next;
+    return true;
+  }
   // Consumer: false when empty; else copies one record into destination.
-  bool Read(ReadTransaction& t, void* destination) noexcept;
+  bool Read(ReadTransaction& t, void* destination) noexcept {
+    char* const at = t.fWorking;
+    if (!HasRecordAt(at)) return false;
+    char* const next = BumpPtr(at);
+    CopyRecord(destination, at);
+    t.fWorking = next;
+    return true;
+  }
+  // Typed forms of Write and Read for a trivially copyable T whose size is
+  // the record size: the copy has a size known at compile time.
+  template <class T>
+  bool WriteRecord(WriteTransaction& t, const T& record) noexcept {
+    static_assert(std::is_trivially_copyable_v<T>);
+    TARN_ASSERT(sizeof(T) == static_cast<std::size_t>(fRecordSize));
+    char* const at = t.fWorking;
+    char* const next = BumpPtr(at);
+    if (!HasRoomBefore(next)) return false;
+    std::memcpy(at, &record, sizeof(T));
+    t.fWorking = next;
+    return true;
+  }
+  template <class T>
+  bool ReadRecord(ReadTransaction& t, T& record) noexcept {
+    static_assert(std::is_trivially_copyable_v<T>);
+    TARN_ASSERT(sizeof(T) == static_cast<std::size_t>(fRecordSize));
+    char* const at = t.fWorking;
+    if (!HasRecordAt(at)) return false;
+    char* const next = BumpPtr(at);
+    std::memcpy(&record, at, sizeof(T));
+    t.fWorking = next;
+    return true;
+  }
+
   // Consumer: the next record in place (no copy), or null when empty. The
   // record stays valid until the read side commits past it.
-  [[nodiscard]] const void* Snoop(ReadTransaction& t) noexcept;
+  [[nodiscard]] const void* Snoop(ReadTransaction& t) noexcept {
+    char* const at = t.fWorking;
+    if (!HasRecordAt(at)) return nullptr;
+    t.fWorking = BumpPtr(at);
+    return at;
+  }
 
   // Publishes the transaction's records (write) or frees their slots (read).
-  void Commit(WriteTransaction& t) noexcept;
-  void Commit(ReadTransaction& t) noexcept;
+  void Commit(WriteTransaction& t) noexcept {
+    fWrite.store(t.fWorking, std::memory_order_release);
+    t.fSaved = t.fWorking;
+  }
+  void Commit(ReadTransaction& t) noexcept {
+    fRead.store(t.fWorking, std::memory_order_release);
+    t.fSaved = t.fWorking;
+  }
   // Rewinds the transaction to its last commit.
   void Abort(WriteTransaction& t) noexcept { t.fWorking = t.fSaved; }
   void Abort(ReadTransaction& t) noexcept { t.fWorking = t.fSaved; }
@@ -98,10 +152,18 @@ class alignas(64) CircularBuffer {
   [[nodiscard]] std::unique_ptr<CircularBuffer> CopyAndResize(int16_t newCapacity);
 
  protected:
-  [[nodiscard]] bool CanRead(const ReadTransaction& t) noexcept;
-  [[nodiscard]] bool CanWrite(const WriteTransaction& t) noexcept;
-  void ReadImplementation(ReadTransaction& t, void* destination) noexcept;
-  void WriteImplementation(WriteTransaction& t, const void* source) noexcept;
+  [[nodiscard]] bool CanRead(const ReadTransaction& t) noexcept { return HasRecordAt(t.fWorking); }
+  [[nodiscard]] bool CanWrite(const WriteTransaction& t) noexcept {
+    return HasRoomBefore(BumpPtr(t.fWorking));
+  }
+  void ReadImplementation(ReadTransaction& t, void* destination) noexcept {
+    CopyRecord(destination, t.fWorking);
+    t.fWorking = BumpPtr(t.fWorking);
+  }
+  void WriteImplementation(WriteTransaction& t, const void* source) noexcept {
+    CopyRecord(t.fWorking, source);
+    t.fWorking = BumpPtr(t.fWorking);
+  }
   [[nodiscard]] char* BumpPtr(char* p) const noexcept {
     char* next = p + fRecordSize;
     return next == fEnd ? fStart : next;
@@ -110,8 +172,26 @@ class alignas(64) CircularBuffer {
  private:
   static constexpr std::size_t kLine = 64;
 
-  // Checks the invariants below (off the hot paths: commits check only that
-  // the published pointer lies inside the storage).
+  // The empty and full tests look at the cached sight of the other side's
+  // pointer first and reload it only when that says empty or full. Callers
+  // read everything they need before copying: the copy goes through char
+  // storage, which the compiler must assume may alias the pointers.
+  [[nodiscard]] bool HasRecordAt(const char* at) noexcept {
+    if (at != fWriteSeenByConsumer) return true;
+    fWriteSeenByConsumer = fWrite.load(std::memory_order_acquire);
+    return at != fWriteSeenByConsumer;
+  }
+  [[nodiscard]] bool HasRoomBefore(const char* next) noexcept {
+    if (next != fReadSeenByProducer) return true;
+    fReadSeenByProducer = fRead.load(std::memory_order_acquire);
+    return next != fReadSeenByProducer;
+  }
+  void CopyRecord(void* to, const void* from) const noexcept {
+    std::memcpy(to, from, static_cast<std::size_t>(fRecordSize));
+  }
+
+  // Checks the invariants below; called off the per-record paths (at
+  // construction, SetEmpty, CopyAndResize, and when a transaction begins).
   void AssertInvariants() const noexcept;
 
   // Invariants (n = (fEnd - fStart) / fRecordSize slots, capacity = n - 1):
