@@ -43,17 +43,28 @@ long KernelThreadID() noexcept {
 }
 
 struct ThreadRecord {
+  enum JoinState { kNotJoined, kJoining, kJoined };
+
   std::atomic<int32_t> references{1};
   uint32_t id = 0;
   std::atomic<long> kernelID{0};  // set by the thread itself
   std::mutex mutex;
-  std::condition_variable ended;
-  bool finished = false;
+  std::condition_variable changed;
+  bool finished = false;  // the entry has returned
   uint32_t exitCode = TarnThreadID::kStillActive;
+  // Threads the library created are joinable: waiting for them joins them
+  // (once), so that a wait ends only after the thread's thread-local
+  // clean-up. The last reference detaches a thread nobody joined.
+  bool created = false;
+  pthread_t thread{};
+  JoinState joinState = kNotJoined;
 
   void AddReference() noexcept { references.fetch_add(1); }
   void Release() noexcept {
-    if (references.fetch_sub(1) == 1) delete this;
+    if (references.fetch_sub(1) == 1) {
+      if (created && joinState == kNotJoined) pthread_detach(thread);
+      delete this;
+    }
   }
 };
 
@@ -91,7 +102,7 @@ void Finish(ThreadRecord* record, uint32_t exitCode) noexcept {
     record->finished = true;
     record->exitCode = exitCode;
   }
-  record->ended.notify_all();
+  record->changed.notify_all();
   Registry& registry = TheRegistry();
   bool registered = false;
   {
@@ -193,15 +204,13 @@ int TarnThreadID::Create(EntryFunction entry, void* arg, bool /*flag*/) noexcept
     return 1;
   }
 
-  pthread_attr_t attributes;
-  pthread_attr_init(&attributes);
-  pthread_attr_setdetachstate(&attributes, PTHREAD_CREATE_DETACHED);
   args->gate.lock();
   record->AddReference();  // ours, as this object's handle
   pthread_t thread;
-  const int result = pthread_create(&thread, &attributes, &StartRoutine, args);
-  pthread_attr_destroy(&attributes);
+  const int result = pthread_create(&thread, nullptr, &StartRoutine, args);
   if (result == 0) {
+    record->thread = thread;
+    record->created = true;
     fHandle = record;
     fID.store(record->id, std::memory_order_relaxed);
   }
@@ -241,7 +250,20 @@ int TarnThreadID::Terminate(uint32_t* exitCode) noexcept {
   ThreadRecord* record = AsRecord(DemandOSThread());
   if (record == nullptr) return 0;
   std::unique_lock<std::mutex> lock(record->mutex);
-  record->ended.wait(lock, [record] { return record->finished; });
+  if (record->created) {
+    record->changed.wait(lock, [record] { return record->joinState != ThreadRecord::kJoining; });
+    if (record->joinState == ThreadRecord::kNotJoined) {
+      if (pthread_equal(record->thread, pthread_self())) return 0;  // cannot wait for itself
+      record->joinState = ThreadRecord::kJoining;
+      lock.unlock();
+      pthread_join(record->thread, nullptr);
+      lock.lock();
+      record->joinState = ThreadRecord::kJoined;
+      record->changed.notify_all();
+    }
+  } else {
+    record->changed.wait(lock, [record] { return record->finished; });
+  }
   if (exitCode != nullptr) *exitCode = record->exitCode;
   return 0;
 }
