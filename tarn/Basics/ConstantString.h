@@ -43,6 +43,7 @@ class ConstantString {
   [[nodiscard]] const char* c_str() const noexcept { return text_; }
   [[nodiscard]] std::size_t length() const noexcept { return std::strlen(text_); }
   [[nodiscard]] bool empty() const noexcept { return text_[0] == 0; }
+  // Refers into this object: do not keep a view of a temporary (a getter's copy).
   [[nodiscard]] std::string_view view() const noexcept { return std::string_view(text_); }
   [[nodiscard]] std::string str() const { return std::string(text_); }
 

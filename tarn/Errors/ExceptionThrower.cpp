@@ -67,7 +67,8 @@ TarnException Convert(const TarnError& error) {
     PutText(record.text1, text1);
     // "<n>,<system><subsystem>". n counts the system characters that survive
     // the cut to 49, so that the record always unpacks to what it holds.
-    const std::string_view system = error.GetSystem().view();
+    const TarnError::Text systemText = error.GetSystem();
+    const std::string_view system = systemText.view();
     std::string text2;
     std::size_t kept = system.size();
     for (;;) {

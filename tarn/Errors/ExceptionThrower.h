@@ -6,7 +6,7 @@
 // never be destroyed during stack unwinding:
 //
 //   { tarn::ExceptionThrower thrower(__FILE__, __LINE__);
-//     static_cast<tarn::TarnError&>(thrower).SetIntErrorCode(status); }  // throws if status != 0
+//     tarn::TarnError& error = thrower; error = status; }  // throws if status != 0
 //
 // TarnExceptionThrower holds a TarnException for a sibling-library call that
 // fills it on failure; its destructor throws Convert(record) when the code is

@@ -61,6 +61,10 @@ class TarnError {
     explicit ErrorCodeProxy(const TarnError& error) noexcept : error_(error) {}
     operator int() const noexcept { return error_.GetIntErrorCode(); }
     operator short() const noexcept { return error_.GetMacOSErrorCode(); }
+    // Compares the 32-bit code (and settles which conversion a comparison uses).
+    friend bool operator==(const ErrorCodeProxy& proxy, int code) noexcept {
+      return proxy.error_.GetIntErrorCode() == code;
+    }
 
    private:
     const TarnError& error_;
@@ -82,6 +86,12 @@ class TarnError {
   TarnError(TarnError&&) noexcept = default;
   TarnError& operator=(const TarnError&) = default;
   TarnError& operator=(TarnError&&) noexcept = default;
+  // Sets the code and keeps every other field: fills an error prepared with a
+  // source location (see ExceptionThrower).
+  TarnError& operator=(int code) noexcept {
+    code_ = code;
+    return *this;
+  }
   ~TarnError() = default;
 
   [[nodiscard]] Text GetKind() const noexcept { return kind_; }

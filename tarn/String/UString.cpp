@@ -7,8 +7,8 @@
 #include <cstring>
 #include <cwchar>
 #include <ostream>
-#include <stdexcept>
 
+#include "tarn/Errors/Fail.h"
 #include "tarn/String/UStringImpl.h"
 
 namespace tarn {
@@ -35,7 +35,7 @@ void AppendBytes(UTF16String& out, const char* bytes, std::size_t n, UString::By
       detail::AppendUTF8(out, bytes, n);
       return;
   }
-  throw std::invalid_argument("UString: unknown ByteEncoding " + std::to_string(int(enc)));
+  Failure(kParamErr);  // unknown ByteEncoding
 }
 
 // Text stored in several encodings at once is not produced by this build; the
@@ -300,7 +300,7 @@ std::string UString::string(ByteEncoding enc, char replacement, bool stopAtNul) 
     case kLatin1Encoding:
       return EncodeBelow(p, n, 0x100, replacement);
   }
-  throw std::invalid_argument("UString: unknown ByteEncoding " + std::to_string(int(enc)));
+  Failure(kParamErr);  // unknown ByteEncoding
 }
 
 unsigned char* UString::pstring(unsigned char* buffer, int bufferSize, ByteEncoding enc,

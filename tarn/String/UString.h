@@ -23,7 +23,7 @@
 // UTF-8; a single char is taken as one ISO-8859-1 byte.
 //
 // Index errors throw std::out_of_range as std::basic_string does; allocation
-// failure propagates. An unknown ByteEncoding value throws std::invalid_argument.
+// failure propagates. An unknown ByteEncoding value throws TarnError -50 (kParamErr).
 // A UString is a value type: distinct objects may be used from different
 // threads; one object is not synchronised.
 //

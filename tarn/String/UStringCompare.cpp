@@ -54,6 +54,7 @@ int UString::Compare(const UString& other, CompareFlags flags) const {
   const bool ignoreCase = (flags & (kIgnoreCase | kIgnoreCaseAlt)) != 0;
   const bool ignoreNonSpace = (flags & kIgnoreNonSpace) != 0;
   if ((flags & kLibraryCompare) != 0) {
+    if (!ignoreCase && !ignoreNonSpace) return NaturalCompare(str_, other.str_);
     return NaturalCompare(Prepare(str_, ignoreCase, ignoreNonSpace),
                           Prepare(other.str_, ignoreCase, ignoreNonSpace));
   }

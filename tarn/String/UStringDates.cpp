@@ -2,9 +2,9 @@
 // calendar arithmetic is done here (proleptic Gregorian) so that dates before
 // 1970 work on every platform; the platform supplies only the UTC offset.
 #include <cstdio>
-#include <stdexcept>
 #include <string>
 
+#include "tarn/Errors/Fail.h"
 #include "tarn/String/UStringFunctions.h"
 #include "tarn/String/UStringImpl.h"
 
@@ -54,8 +54,7 @@ Civil LocalCivil(std::uint32_t seconds1904) {
 
 void CheckFormat(DateTimeFormat format) {
   if (static_cast<int>(format) < 0 || static_cast<int>(format) > 3) {
-    throw std::invalid_argument("unknown DateTimeFormat " +
-                                std::to_string(static_cast<int>(format)));
+    Failure(kParamErr);
   }
 }
 

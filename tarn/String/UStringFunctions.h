@@ -8,9 +8,9 @@
 // the whole-string forms may use full mappings where the platform offers them).
 //
 // Number and date texts are locale-independent: '.' as decimal point, ','
-// as thousands separator, English month and day names. None of these functions
-// throw except for allocation failure, std::invalid_argument for a base outside
-// 0 and 2..36, and out-of-range enumeration values.
+// as thousands separator, English month and day names. Nothing here throws
+// except for allocation failure and TarnError -50 (kParamErr) for a number
+// base outside 0 and 2..36 or an out-of-range enumeration value.
 #pragma once
 
 #include <cstddef>

@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <charconv>
 #include <limits>
-#include <stdexcept>
 #include <string>
 
+#include "tarn/Errors/Fail.h"
 #include "tarn/String/UStringFunctions.h"
 
 namespace tarn {
@@ -30,7 +30,7 @@ struct ParsedInt {
 // (e.g. thousands separators) are passed over between digits.
 ParsedInt ScanInt(const UString& s, int base, unsigned short skip = 0) {
   if (base != 0 && (base < 2 || base > 36)) {
-    throw std::invalid_argument("number base must be 0 or 2..36, not " + std::to_string(base));
+    Failure(kParamErr);
   }
   ParsedInt r;
   const std::size_t n = s.length();
@@ -110,7 +110,7 @@ void NumToUString(std::int64_t n, NumFormat format, UString& out) {
       out = UString("0x") + NumToHexUString(static_cast<std::uint64_t>(n));
       return;
   }
-  throw std::invalid_argument("unknown NumFormat " + std::to_string(static_cast<int>(format)));
+  Failure(kParamErr);
 }
 
 std::int64_t UStringToNum(const UString& s, NumFormat format) {
@@ -127,7 +127,7 @@ std::int64_t UStringToNum(const UString& s, NumFormat format) {
       return p.negative ? static_cast<std::int64_t>(0 - p.magnitude) : bits;
     }
   }
-  throw std::invalid_argument("unknown NumFormat " + std::to_string(static_cast<int>(format)));
+  Failure(kParamErr);
 }
 
 std::int32_t StrToL(const UString& s, UString* rest, int base) {

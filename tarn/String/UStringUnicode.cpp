@@ -48,13 +48,25 @@ void AppendUTF32(UTF16String& out, const unsigned int* units, std::size_t n) {
 }
 
 void AppendUTF8(UTF16String& out, const char* bytes, std::size_t n) {
+  // Never more units than bytes: write into the grown buffer, then trim.
   const auto* p = reinterpret_cast<const unsigned char*>(bytes);
-  out.reserve(out.size() + n);
+  const std::size_t base = out.size();
+  out.resize(base + n);
+  unsigned short* o = out.data() + base;
+  auto put = [&o](std::uint32_t cp) {
+    if (cp < 0x10000) {
+      *o++ = static_cast<unsigned short>(cp);
+    } else {
+      cp -= 0x10000;
+      *o++ = static_cast<unsigned short>(0xD800 + (cp >> 10));
+      *o++ = static_cast<unsigned short>(0xDC00 + (cp & 0x3FF));
+    }
+  };
   std::size_t i = 0;
   while (i < n) {
     const unsigned b = p[i++];
     if (b < 0x80) {
-      out.push_back(static_cast<unsigned short>(b));
+      *o++ = static_cast<unsigned short>(b);
       continue;
     }
     int need = 0;
@@ -74,7 +86,7 @@ void AppendUTF8(UTF16String& out, const char* bytes, std::size_t n) {
       if (b == 0xF0) lo = 0x90;  // no overlong forms
       if (b == 0xF4) hi = 0x8F;  // nothing above U+10FFFF
     } else {
-      out.push_back(kReplacementUnit);
+      *o++ = kReplacementUnit;
       continue;
     }
     bool ok = true;
@@ -89,30 +101,41 @@ void AppendUTF8(UTF16String& out, const char* bytes, std::size_t n) {
         break;
       }
     }
-    AppendCodePoint(out, ok ? cp : kReplacementUnit);
+    put(ok ? cp : kReplacementUnit);
   }
+  out.resize(static_cast<std::size_t>(o - out.data()));
 }
 
 std::string ToUTF8(const unsigned short* units, std::size_t n) {
-  std::string out;
-  out.reserve(n);
-  ForEachCodePoint(units, n, [&out](std::uint32_t cp) {
-    if (cp < 0x80) {
-      out.push_back(static_cast<char>(cp));
-    } else if (cp < 0x800) {
-      out.push_back(static_cast<char>(0xC0 | (cp >> 6)));
-      out.push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-    } else if (cp < 0x10000) {
-      out.push_back(static_cast<char>(0xE0 | (cp >> 12)));
-      out.push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-    } else {
-      out.push_back(static_cast<char>(0xF0 | (cp >> 18)));
-      out.push_back(static_cast<char>(0x80 | ((cp >> 12) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | (cp & 0x3F)));
+  // At most three bytes per unit (a surrogate pair gives four for two units).
+  std::string out(n * 3, '\0');
+  char* o = out.data();
+  std::size_t i = 0;
+  while (i < n) {
+    // Runs of ASCII are the common case.
+    while (i < n && units[i] < 0x80) *o++ = static_cast<char>(units[i++]);
+    if (i == n) break;
+    std::uint32_t cp = units[i++];
+    if (IsHighSurrogate(cp) && i < n && IsLowSurrogate(units[i])) {
+      cp = 0x10000u + ((cp - 0xD800u) << 10) + (units[i++] - 0xDC00u);
+    } else if (IsHighSurrogate(cp) || IsLowSurrogate(cp)) {
+      cp = kReplacementUnit;
     }
-  });
+    if (cp < 0x800) {
+      *o++ = static_cast<char>(0xC0 | (cp >> 6));
+      *o++ = static_cast<char>(0x80 | (cp & 0x3F));
+    } else if (cp < 0x10000) {
+      *o++ = static_cast<char>(0xE0 | (cp >> 12));
+      *o++ = static_cast<char>(0x80 | ((cp >> 6) & 0x3F));
+      *o++ = static_cast<char>(0x80 | (cp & 0x3F));
+    } else {
+      *o++ = static_cast<char>(0xF0 | (cp >> 18));
+      *o++ = static_cast<char>(0x80 | ((cp >> 12) & 0x3F));
+      *o++ = static_cast<char>(0x80 | ((cp >> 6) & 0x3F));
+      *o++ = static_cast<char>(0x80 | (cp & 0x3F));
+    }
+  }
+  out.resize(static_cast<std::size_t>(o - out.data()));
   return out;
 }
 

@@ -12,9 +12,8 @@
 #include <array>
 #include <climits>
 #include <ctime>
-#include <new>
-#include <stdexcept>
 
+#include "tarn/Errors/Fail.h"
 #include "tarn/String/UStringImpl.h"
 
 namespace tarn::detail {
@@ -27,14 +26,14 @@ const UChar* U(const unsigned short* p) { return reinterpret_cast<const UChar*>(
 UChar* U(unsigned short* p) { return reinterpret_cast<UChar*>(p); }
 
 int32_t Len(std::size_t n) {
-  if (n > static_cast<std::size_t>(INT32_MAX)) throw std::length_error("UString: text too long");
+  if (n > static_cast<std::size_t>(INT32_MAX)) Failure(kParamErr);
   return static_cast<int32_t>(n);
 }
 
-void Check(UErrorCode err, const char* what) {
+void Check(UErrorCode err) {
   if (U_FAILURE(err)) {
-    if (err == U_MEMORY_ALLOCATION_ERROR) throw std::bad_alloc();
-    throw std::runtime_error(std::string("UString: ICU ") + what + " failed: " + u_errorName(err));
+    if (err == U_MEMORY_ALLOCATION_ERROR) FailMemFullError();
+    Failure(kParamErr);
   }
 }
 
@@ -54,9 +53,9 @@ class Converters {
     if (c == nullptr) {
       UErrorCode err = U_ZERO_ERROR;
       c = ucnv_open(codePage == 0 ? "windows-1252" : "macintosh", &err);
-      Check(err, "ucnv_open");
+      Check(err);
       ucnv_setSubstChars(c, "?", 1, &err);
-      Check(err, "ucnv_setSubstChars");
+      Check(err);
     }
     return c;
   }
@@ -73,7 +72,7 @@ UConverter* ConverterFor(int codePage) {
 // Runs an ICU "fill this buffer" call, growing the buffer once if the first
 // guess was too small.
 template <typename Call>
-UTF16String Transform(std::size_t guess, Call&& call, const char* what) {
+UTF16String Transform(std::size_t guess, Call&& call) {
   UTF16String out(guess, 0);
   UErrorCode err = U_ZERO_ERROR;
   int32_t n = call(U(out.data()), Len(out.size()), &err);
@@ -83,7 +82,7 @@ UTF16String Transform(std::size_t guess, Call&& call, const char* what) {
     n = call(U(out.data()), Len(out.size()), &err);
   }
   if (err == U_STRING_NOT_TERMINATED_WARNING) err = U_ZERO_ERROR;
-  Check(err, what);
+  Check(err);
   out.resize(static_cast<std::size_t>(n));
   return out;
 }
@@ -95,7 +94,7 @@ class Collators {
     for (int i = 0; i < 4; ++i) {
       UErrorCode err = U_ZERO_ERROR;
       coll_[i] = ucol_open("", &err);
-      Check(err, "ucol_open");
+      Check(err);
       const bool ignoreCase = (i & 1) != 0, ignoreNonSpace = (i & 2) != 0;
       if (ignoreNonSpace) {
         ucol_setStrength(coll_[i], UCOL_PRIMARY);
@@ -103,7 +102,7 @@ class Collators {
       } else {
         ucol_setStrength(coll_[i], ignoreCase ? UCOL_SECONDARY : UCOL_TERTIARY);
       }
-      Check(err, "ucol_setAttribute");
+      Check(err);
     }
   }
   Collators(const Collators&) = delete;
@@ -124,12 +123,9 @@ class Collators {
 void AppendCodePage(UTF16String& out, const char* bytes, std::size_t n, int codePage) {
   if (n == 0) return;
   UConverter* cnv = ConverterFor(codePage);
-  const UTF16String units = Transform(
-      n + 1,
-      [&](UChar* dst, int32_t cap, UErrorCode* err) {
-        return ucnv_toUChars(cnv, dst, cap, bytes, Len(n), err);
-      },
-      "ucnv_toUChars");
+  const UTF16String units = Transform(n + 1, [&](UChar* dst, int32_t cap, UErrorCode* err) {
+    return ucnv_toUChars(cnv, dst, cap, bytes, Len(n), err);
+  });
   out.append(units);
 }
 
@@ -144,7 +140,7 @@ std::string FromCodePage(const unsigned short* units, std::size_t n, int codePag
     err = U_ZERO_ERROR;
     len = ucnv_fromUChars(cnv, out.data(), Len(out.size()), U(units), Len(n), &err);
   }
-  Check(err, "ucnv_fromUChars");
+  Check(err);
   out.resize(static_cast<std::size_t>(len));
   return out;
 }
@@ -160,13 +156,10 @@ int SystemCompare(const unsigned short* a, std::size_t na, const unsigned short*
 UTF16String StripNonSpacing(const UTF16String& s) {
   UErrorCode err = U_ZERO_ERROR;
   const UNormalizer2* nfd = unorm2_getNFDInstance(&err);
-  Check(err, "unorm2_getNFDInstance");
-  const UTF16String d = Transform(
-      s.size() * 3 + 1,
-      [&](UChar* dst, int32_t cap, UErrorCode* e) {
-        return unorm2_normalize(nfd, U(s.data()), Len(s.size()), dst, cap, e);
-      },
-      "unorm2_normalize");
+  Check(err);
+  const UTF16String d = Transform(s.size() * 3 + 1, [&](UChar* dst, int32_t cap, UErrorCode* e) {
+    return unorm2_normalize(nfd, U(s.data()), Len(s.size()), dst, cap, e);
+  });
   UTF16String out;
   out.reserve(d.size());
   const int32_t len = Len(d.size());
@@ -186,25 +179,19 @@ unsigned short MapCaseUnit(unsigned short c, bool upper) {
 
 void MapCaseString(UTF16String& s, bool upper) {
   if (s.empty()) return;
-  s = Transform(
-      s.size() + 8,
-      [&](UChar* dst, int32_t cap, UErrorCode* err) {
-        return upper ? u_strToUpper(dst, cap, U(s.data()), Len(s.size()), "", err)
-                     : u_strToLower(dst, cap, U(s.data()), Len(s.size()), "", err);
-      },
-      "case mapping");
+  s = Transform(s.size() + 8, [&](UChar* dst, int32_t cap, UErrorCode* err) {
+    return upper ? u_strToUpper(dst, cap, U(s.data()), Len(s.size()), "", err)
+                 : u_strToLower(dst, cap, U(s.data()), Len(s.size()), "", err);
+  });
 }
 
 UTF16String NormalizeKC(const UTF16String& s) {
   UErrorCode err = U_ZERO_ERROR;
   const UNormalizer2* nfkc = unorm2_getNFKCInstance(&err);
-  Check(err, "unorm2_getNFKCInstance");
-  return Transform(
-      s.size() + 8,
-      [&](UChar* dst, int32_t cap, UErrorCode* e) {
-        return unorm2_normalize(nfkc, U(s.data()), Len(s.size()), dst, cap, e);
-      },
-      "unorm2_normalize");
+  Check(err);
+  return Transform(s.size() + 8, [&](UChar* dst, int32_t cap, UErrorCode* e) {
+    return unorm2_normalize(nfkc, U(s.data()), Len(s.size()), dst, cap, e);
+  });
 }
 
 bool SystemIsRoman() { return true; }

@@ -6,11 +6,10 @@
 
 #include <climits>
 #include <ctime>
-#include <new>
-#include <stdexcept>
 #include <string>
 #include <vector>
 
+#include "tarn/Errors/Fail.h"
 #include "tarn/String/UStringImpl.h"
 
 namespace tarn::detail {
@@ -22,26 +21,25 @@ const wchar_t* W(const unsigned short* p) { return reinterpret_cast<const wchar_
 wchar_t* W(unsigned short* p) { return reinterpret_cast<wchar_t*>(p); }
 
 int Len(std::size_t n) {
-  if (n > static_cast<std::size_t>(INT_MAX)) throw std::length_error("UString: text too long");
+  if (n > static_cast<std::size_t>(INT_MAX)) Failure(kParamErr);
   return static_cast<int>(n);
 }
 
 UINT CodePage(int codePage) { return codePage == 0 ? CP_ACP : 10000; }
 
-[[noreturn]] void Fail(const char* what) {
-  const DWORD e = GetLastError();
-  if (e == ERROR_NOT_ENOUGH_MEMORY || e == ERROR_OUTOFMEMORY) throw std::bad_alloc();
-  throw std::runtime_error(std::string("UString: ") + what + " failed, Windows error " +
-                           std::to_string(e));
+// A failed system call: the thread's last Windows error as a TarnError.
+[[noreturn]] void Fail() {
+  FailWinAPIError(0);
+  Failure(kParamErr);  // the call set no error code
 }
 
 UTF16String MapString(const UTF16String& s, DWORD flags) {
   if (s.empty()) return s;
   int n = LCMapStringW(LOCALE_INVARIANT, flags, W(s.data()), Len(s.size()), nullptr, 0);
-  if (n <= 0) Fail("LCMapStringW");
+  if (n <= 0) Fail();
   UTF16String out(static_cast<std::size_t>(n), 0);
   n = LCMapStringW(LOCALE_INVARIANT, flags, W(s.data()), Len(s.size()), W(out.data()), n);
-  if (n <= 0) Fail("LCMapStringW");
+  if (n <= 0) Fail();
   out.resize(static_cast<std::size_t>(n));
   return out;
 }
@@ -50,17 +48,17 @@ UTF16String Normalize(NORM_FORM form, const UTF16String& s) {
   if (s.empty()) return s;
   int guess = NormalizeString(form, W(s.data()), Len(s.size()), nullptr, 0);
   for (int attempt = 0; attempt < 8; ++attempt) {
-    if (guess <= 0) Fail("NormalizeString");
+    if (guess <= 0) Fail();
     UTF16String out(static_cast<std::size_t>(guess), 0);
     const int n = NormalizeString(form, W(s.data()), Len(s.size()), W(out.data()), guess);
     if (n > 0) {
       out.resize(static_cast<std::size_t>(n));
       return out;
     }
-    if (GetLastError() != ERROR_INSUFFICIENT_BUFFER) Fail("NormalizeString");
+    if (GetLastError() != ERROR_INSUFFICIENT_BUFFER) Fail();
     guess = -n;  // the function returns the negated new estimate
   }
-  Fail("NormalizeString");
+  Fail();
 }
 
 }  // namespace
@@ -69,11 +67,11 @@ void AppendCodePage(UTF16String& out, const char* bytes, std::size_t n, int code
   if (n == 0) return;
   const UINT cp = CodePage(codePage);
   const int len = MultiByteToWideChar(cp, 0, bytes, Len(n), nullptr, 0);
-  if (len <= 0) Fail("MultiByteToWideChar");
+  if (len <= 0) Fail();
   const std::size_t start = out.size();
   out.resize(start + static_cast<std::size_t>(len));
   if (MultiByteToWideChar(cp, 0, bytes, Len(n), W(out.data() + start), len) != len) {
-    Fail("MultiByteToWideChar");
+    Fail();
   }
 }
 
@@ -81,10 +79,10 @@ std::string FromCodePage(const unsigned short* units, std::size_t n, int codePag
   if (n == 0) return {};
   const UINT cp = CodePage(codePage);
   const int len = WideCharToMultiByte(cp, 0, W(units), Len(n), nullptr, 0, nullptr, nullptr);
-  if (len <= 0) Fail("WideCharToMultiByte");
+  if (len <= 0) Fail();
   std::string out(static_cast<std::size_t>(len), '\0');
   if (WideCharToMultiByte(cp, 0, W(units), Len(n), out.data(), len, nullptr, nullptr) != len) {
-    Fail("WideCharToMultiByte");
+    Fail();
   }
   return out;
 }
@@ -95,7 +93,7 @@ int SystemCompare(const unsigned short* a, std::size_t na, const unsigned short*
   if (ignoreCase) flags |= NORM_IGNORECASE;
   if (ignoreNonSpace) flags |= NORM_IGNORENONSPACE;
   const int r = CompareStringW(LOCALE_SYSTEM_DEFAULT, flags, W(a), Len(na), W(b), Len(nb));
-  if (r == 0) Fail("CompareStringW");
+  if (r == 0) Fail();
   return r - CSTR_EQUAL;
 }
 
@@ -104,7 +102,7 @@ UTF16String StripNonSpacing(const UTF16String& s) {
   if (d.empty()) return d;
   std::vector<WORD> types(d.size(), 0);
   if (!GetStringTypeW(CT_CTYPE3, W(d.data()), Len(d.size()), types.data())) {
-    Fail("GetStringTypeW");
+    Fail();
   }
   UTF16String out;
   out.reserve(d.size());
@@ -129,9 +127,10 @@ UTF16String NormalizeKC(const UTF16String& s) { return Normalize(NormalizationKC
 bool SystemIsRoman() { return GetACP() == 1252; }
 
 std::int64_t LocalOffsetSeconds(std::int64_t unixSeconds) {
-  // The C runtime (which honours TZ) rejects times before 1970; those use the
-  // offset in force at 1970.
-  const __time64_t t = static_cast<__time64_t>(unixSeconds < 0 ? 0 : unixSeconds);
+  // The C runtime (which honours TZ) rejects times whose local time falls
+  // before 1970; earlier times use the offset in force early in January 1970.
+  constexpr std::int64_t kEarliest = 2 * 86400;
+  const __time64_t t = static_cast<__time64_t>(unixSeconds < kEarliest ? kEarliest : unixSeconds);
   std::tm local{};
   if (_localtime64_s(&local, &t) != 0) return 0;
   const __time64_t asUTC = _mkgmtime64(&local);

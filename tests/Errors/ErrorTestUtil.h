@@ -4,9 +4,15 @@
 #include <gtest/gtest.h>
 
 #include <optional>
+#include <ostream>
 #include <string>
 
 #include "tarn/Errors/TarnError.h"
+
+namespace tarn {
+// Prints errors in test failures as their one-line description.
+inline void PrintTo(const TarnError& error, std::ostream* os) { *os << error.Describe(); }
+}  // namespace tarn
 
 namespace tarn::testing {
 

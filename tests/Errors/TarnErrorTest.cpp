@@ -82,6 +82,9 @@ TEST(TarnErrorMacOSCode, ProxyConvertsToIntAndShort) {
   short asShort = e.GetErrorCode();
   EXPECT_EQ(asInt, 0x10000);
   EXPECT_EQ(asShort, 32767);
+  EXPECT_TRUE(e.GetErrorCode() == 0x10000);
+  EXPECT_TRUE(e.GetErrorCode() != 32767);
+  EXPECT_TRUE(0x10000 == e.GetErrorCode());
 }
 
 TEST(TarnErrorQueries, MacOSAndFileSystemErrors) {
