@@ -39,8 +39,7 @@ class UUIDObj {
   constexpr UUIDObj(std::uint8_t b0, std::uint8_t b1, std::uint8_t b2, std::uint8_t b3,
                     std::uint8_t b4, std::uint8_t b5, std::uint8_t b6, std::uint8_t b7,
                     std::uint8_t b8, std::uint8_t b9, std::uint8_t b10, std::uint8_t b11,
-                    std::uint8_t b12, std::uint8_t b13, std::uint8_t b14,
-                    std::uint8_t b15) noexcept
+                    std::uint8_t b12, std::uint8_t b13, std::uint8_t b14, std::uint8_t b15) noexcept
       : fBytes{b0, b1, b2, b3, b4, b5, b6, b7, b8, b9, b10, b11, b12, b13, b14, b15} {}
   // From the hyphenated text form "xxxxxxxx-xxxx-xxxx-xxxx-xxxxxxxxxxxx"
   // (hex digits in either case, optionally in braces). The empty text gives

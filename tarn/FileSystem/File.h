@@ -52,8 +52,8 @@ class File {
   // Creates a new, empty file (fails if anything exists at the final name).
   // With kAdjustName the name is first made unique; the returned File names
   // the file actually created.
-  static File CreateOnDisk(const FileSpecification& spec, FileTypeClass type,
-                           FileTypeClass creator, AdjustName adjust = kDontAdjustName);
+  static File CreateOnDisk(const FileSpecification& spec, FileTypeClass type, FileTypeClass creator,
+                           AdjustName adjust = kDontAdjustName);
   // As CreateOnDisk, and creates an empty resource fork.
   static File CreateResFileOnDisk(const FileSpecification& spec, FileTypeClass type,
                                   FileTypeClass creator, AdjustName adjust = kDontAdjustName);

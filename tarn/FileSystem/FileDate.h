@@ -5,6 +5,7 @@
 // a date read back after Set may be rounded down to that resolution.
 #pragma once
 
+#include <compare>
 #include <cstdint>
 
 namespace tarn {

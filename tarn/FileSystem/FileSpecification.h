@@ -58,8 +58,8 @@ class FileSpecification {
   // Path and names.
   [[nodiscard]] UString GetFullPath() const;
   void GetFullPath(UString& path) const;
-  [[nodiscard]] UString GetName() const;  // last component; for a root, the root itself
-  void SetName(const UString& name);      // replaces the last component
+  [[nodiscard]] UString GetName() const;         // last component; for a root, the root itself
+  void SetName(const UString& name);             // replaces the last component
   [[nodiscard]] UString GetDisplayName() const;  // the name as shown to users
   [[nodiscard]] UString GetDisplayPath() const;  // the full path as shown to users
   [[nodiscard]] UString GetFileURL() const;      // "file://" URL, UTF-8 percent-encoded
@@ -74,7 +74,7 @@ class FileSpecification {
   [[nodiscard]] bool Exists() const;
   [[nodiscard]] bool IsFile() const;
   [[nodiscard]] bool IsFolder() const;
-  [[nodiscard]] bool IsVolume() const;  // the path is a root
+  [[nodiscard]] bool IsVolume() const;       // the path is a root
   [[nodiscard]] bool IsApplication() const;  // an existing file named *.exe
 
   // Gives the specification a name at which no object of the mode's kind
@@ -86,6 +86,12 @@ class FileSpecification {
   void MakeUnique(MakeUniqueMode mode = kMakeUniqueAnything);
   void MakeUniqueAddingExtension(const UString& extension,
                                  MakeUniqueMode mode = kMakeUniqueAnything);
+  // The n-th name MakeUnique tries: base, a space, n, extension, with the
+  // base cut (never inside a surrogate pair) so that the result has at most
+  // kMaxNameLength units. An extension too long to leave room is cut as
+  // part of the base instead.
+  [[nodiscard]] static UString MakeUniqueCandidate(const UString& base, const UString& extension,
+                                                   unsigned n);
 
   class Impl;
 

@@ -25,16 +25,26 @@ enum class PathKind { kNone, kFile, kFolder, kOther };
 
 // Queries; never throw.
 [[nodiscard]] PathKind GetPathKind(const UString& path) noexcept;
+// Whether a file (or a file's stream) can be opened at the path.
+[[nodiscard]] bool IsExistingFile(const UString& path) noexcept;
 
-// Operations; each throws the system's error as a TarnError.
+// The resource fork of the file at a path is at the path plus this suffix:
+// an alternate data stream on Windows (which travels with its file), a file of
+// its own on POSIX and on file systems without streams (which File carries
+// along when it renames or deletes).
+inline constexpr char kResourceForkSuffix[] = ":AFP_Resource";
+
+// Operations; each throws the system's error as a TarnError (kind "Windows"
+// or "POSIX"), with the path as attachment.
 void CreateNewFile(const UString& path);  // fails if anything exists there
-[[nodiscard]] std::FILE* OpenFile(const UString& path, const char* mode);
-[[nodiscard]] std::int64_t GetFileSize(const UString& path);
-void RenameNoReplace(const UString& from, const UString& to);
+// With throwOnFailure false a failure returns null instead.
+[[nodiscard]] std::FILE* OpenFile(const UString& path, const char* mode, bool throwOnFailure);
+// With missingIsZero a missing file has size 0 instead of failing.
+[[nodiscard]] std::int64_t FileSizeOf(const UString& path, bool missingIsZero);
+void RenameNoReplace(const UString& from, const UString& to);  // fails if `to` exists
 void RenameReplacing(const UString& from, const UString& to);
-void DeleteFile(const UString& path);
+void RemoveFile(const UString& path);
 [[nodiscard]] FileDate GetModificationDate(const UString& path);
 void SetModificationDate(const UString& path, const FileDate& date);
-[[nodiscard]] FileDate Now();
 
 }  // namespace tarn::fsimpl

@@ -18,7 +18,8 @@ namespace tarn {
 class FileTypeClass {
  public:
   constexpr FileTypeClass() noexcept = default;
-  constexpr FileTypeClass(std::uint32_t code) noexcept : fCode(code) {}  // NOLINT: implicit by design
+  constexpr FileTypeClass(std::uint32_t code) noexcept
+      : fCode(code) {}  // NOLINT: implicit by design
   // From a four-character literal: FileTypeClass("WAVE").
   constexpr FileTypeClass(const char (&text)[5]) noexcept
       : fCode((std::uint32_t(std::uint8_t(text[0])) << 24) |

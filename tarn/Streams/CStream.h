@@ -118,7 +118,8 @@ class CStream {
   // Reads up to and including `terminator`, or `max` bytes, or to the end of
   // the data, whichever comes first; returns the count read.
   virtual int GetThruN(void* buffer, char terminator, int max) = 0;
-  // GetThruN(buffer, 0, max).
+  // GetThruN(buffer, 0, max); data that end before both the NUL and `max`
+  // bytes fail with -39.
   virtual void GetStr(char* buffer, int max);
   // `buffer` holds 256 bytes: a length byte and up to 255 characters.
   virtual void GetStr255(unsigned char* buffer);
@@ -137,7 +138,8 @@ class CStream {
   [[nodiscard]] tarnPoint GetPoint();
   virtual void GetRect(tarnRect& r);
   [[nodiscard]] tarnRect GetRect();
-  // Fails with 2 when no number text is found.
+  // Fails with 2 when no number text is found, with -39 when the data end
+  // inside the text.
   [[nodiscard]] virtual double _GetDouble();
   [[nodiscard]] virtual double GetIEEEDouble();
   // Texts over 65,535 bytes are cut there; the stream still moves past the

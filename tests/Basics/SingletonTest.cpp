@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <memory>
 #include <string>
 #include <thread>
 #include <vector>
@@ -43,19 +44,18 @@ TEST(SingletonManager, ConstructsLastRegisteredFirstAndOnlyOnce) {
 
 TEST(SingletonManager, DestroysInReverseOrderOfRegistrationAndSkipsUnregistered) {
   std::string log;
-  {
-    SingletonManager m;
-    LoggingConstructor a(m, "A", log), b(m, "B", log), never(m, "N", log), c(m, "C", log);
-    a.Register();
-    c.Register();
-    b.Register();
-    m.DestroyAll();
-    EXPECT_EQ(m.GetState(), SingletonManager::kDestroying);
-    EXPECT_EQ(log, "dBdCdA");
-    m.DestroyAll();  // list consumed: nothing twice
-    EXPECT_EQ(log, "dBdCdA");
-    a.Register();
-  }  // the manager's destruction destroys what is still registered
+  auto m = std::make_unique<SingletonManager>();
+  LoggingConstructor a(*m, "A", log), b(*m, "B", log), never(*m, "N", log), c(*m, "C", log);
+  a.Register();
+  c.Register();
+  b.Register();
+  m->DestroyAll();
+  EXPECT_EQ(m->GetState(), SingletonManager::kDestroying);
+  EXPECT_EQ(log, "dBdCdA");
+  m->DestroyAll();  // list consumed: nothing twice
+  EXPECT_EQ(log, "dBdCdA");
+  a.Register();
+  m.reset();  // the manager's destruction destroys what is still registered
   EXPECT_EQ(log, "dBdCdAdA");
 }
 
