@@ -59,6 +59,17 @@ void AppendWide(UTF16String& out, const wchar_t* w, std::size_t n) {
   }
 }
 
+// A null pointer reads as an empty text; with a nonzero count it is an error.
+void CheckPointer(const void* p, std::size_t count) {
+  if (p == nullptr && count != 0) Failure(kParamErr);
+}
+
+std::size_t CLength(const char* s) { return s == nullptr ? 0 : std::strlen(s); }
+std::size_t WLength(const wchar_t* s) { return s == nullptr ? 0 : std::wcslen(s); }
+std::size_t ULength(const unsigned short* s) {
+  return s == nullptr ? 0 : UTF16String::traits_type::length(s);
+}
+
 UTF16String Units(const std::string& ascii) {
   UTF16String u;
   u.reserve(ascii.size());
@@ -68,7 +79,7 @@ UTF16String Units(const std::string& ascii) {
 
 UTF16String Units(const char* ascii) {
   UTF16String u;
-  for (; *ascii != 0; ++ascii) u.push_back(static_cast<unsigned char>(*ascii));
+  for (; ascii != nullptr && *ascii != 0; ++ascii) u.push_back(static_cast<unsigned char>(*ascii));
   return u;
 }
 
@@ -110,8 +121,8 @@ UString::UString(const unsigned char* bytes, size_type byteCount, ByteEncoding e
   assign(bytes, byteCount, enc);
 }
 UString::UString(const std::string& bytes, ByteEncoding enc) { assign(bytes, enc); }
-UString::UString(const unsigned short* utf16) : str_(utf16) {}
-UString::UString(const unsigned short* utf16, size_type count) : str_(utf16, count) {}
+UString::UString(const unsigned short* utf16) { assign(utf16); }
+UString::UString(const unsigned short* utf16, size_type count) { assign(utf16, count); }
 UString::UString(const UTF16String& utf16) : str_(utf16) {}
 UString::UString(UTF16String&& utf16) noexcept : str_(std::move(utf16)) {}
 UString::UString(const UTF32String& utf32) { assign(utf32); }
@@ -140,15 +151,20 @@ UString& UString::assign(const UString& other, size_type pos, size_type count) {
   return *this;
 }
 UString& UString::assign(const char* bytes, ByteEncoding enc) {
-  return assign(bytes, std::strlen(bytes), enc);
+  return assign(bytes, CLength(bytes), enc);
 }
 UString& UString::assign(const char* bytes, size_type byteCount, ByteEncoding enc) {
+  CheckPointer(bytes, byteCount);
   UTF16String s;
   AppendBytes(s, bytes, byteCount, enc);
   str_.swap(s);
   return *this;
 }
 UString& UString::assign(const unsigned char* pascal, ByteEncoding enc) {
+  if (pascal == nullptr) {
+    str_.clear();
+    return *this;
+  }
   return assign(pascal + 1, pascal[0], enc);
 }
 UString& UString::assign(const unsigned char* bytes, size_type byteCount, ByteEncoding enc) {
@@ -157,12 +173,14 @@ UString& UString::assign(const unsigned char* bytes, size_type byteCount, ByteEn
 UString& UString::assign(const std::string& bytes, ByteEncoding enc) {
   return assign(bytes.data(), bytes.size(), enc);
 }
-UString& UString::assign(const unsigned short* utf16) {
-  str_.assign(utf16);
-  return *this;
-}
+UString& UString::assign(const unsigned short* utf16) { return assign(utf16, ULength(utf16)); }
 UString& UString::assign(const unsigned short* utf16, size_type count) {
-  str_.assign(utf16, count);
+  CheckPointer(utf16, count);
+  if (utf16 == nullptr) {
+    str_.clear();
+  } else {
+    str_.assign(utf16, count);
+  }
   return *this;
 }
 UString& UString::assign(const UTF16String& utf16) {
@@ -177,7 +195,7 @@ UString& UString::assign(const UTF32String& utf32) {
 }
 UString& UString::assign(const wchar_t* wide) {
   UTF16String s;
-  AppendWide(s, wide, std::wcslen(wide));
+  AppendWide(s, wide, WLength(wide));
   str_.swap(s);
   return *this;
 }
@@ -211,13 +229,15 @@ UString& UString::append(const UString& other, size_type pos, size_type count) {
   return *this;
 }
 UString& UString::append(const char* bytes, ByteEncoding enc) {
-  return append(bytes, std::strlen(bytes), enc);
+  return append(bytes, CLength(bytes), enc);
 }
 UString& UString::append(const char* bytes, size_type byteCount, ByteEncoding enc) {
+  CheckPointer(bytes, byteCount);
   AppendBytes(str_, bytes, byteCount, enc);
   return *this;
 }
 UString& UString::append(const unsigned char* pascal, ByteEncoding enc) {
+  if (pascal == nullptr) return *this;
   return append(pascal + 1, pascal[0], enc);
 }
 UString& UString::append(const unsigned char* bytes, size_type byteCount, ByteEncoding enc) {
@@ -226,12 +246,10 @@ UString& UString::append(const unsigned char* bytes, size_type byteCount, ByteEn
 UString& UString::append(const std::string& bytes, ByteEncoding enc) {
   return append(bytes.data(), bytes.size(), enc);
 }
-UString& UString::append(const unsigned short* utf16) {
-  str_.append(utf16);
-  return *this;
-}
+UString& UString::append(const unsigned short* utf16) { return append(utf16, ULength(utf16)); }
 UString& UString::append(const unsigned short* utf16, size_type count) {
-  str_.append(utf16, count);
+  CheckPointer(utf16, count);
+  if (count != 0) str_.append(utf16, count);
   return *this;
 }
 UString& UString::append(const UTF16String& utf16) {
@@ -243,7 +261,7 @@ UString& UString::append(const UTF32String& utf32) {
   return *this;
 }
 UString& UString::append(const wchar_t* wide) {
-  AppendWide(str_, wide, std::wcslen(wide));
+  AppendWide(str_, wide, WLength(wide));
   return *this;
 }
 UString& UString::append(const std::wstring& wide) {

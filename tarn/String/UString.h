@@ -23,7 +23,9 @@
 // UTF-8; a single char is taken as one ISO-8859-1 byte.
 //
 // Index errors throw std::out_of_range as std::basic_string does; allocation
-// failure propagates. An unknown ByteEncoding value throws TarnError -50 (kParamErr).
+// failure propagates. An unknown ByteEncoding value, and a null source pointer
+// with a nonzero count, throw TarnError -50 (kParamErr); a null source pointer
+// without a count reads as an empty text.
 // A UString is a value type: distinct objects may be used from different
 // threads; one object is not synchronised.
 //

@@ -56,6 +56,14 @@ TEST(UStringEncoding, SystemEncodingIsWindows1252BothWays) {
     EXPECT_EQ(s[i], static_cast<unsigned char>(all[i]));
   }
   EXPECT_EQ(s.string(UString::kSystemEncoding), all);
+  // Every byte survives the round trip; the five bytes 1252 leaves unassigned
+  // read as the C1 controls of the same value.
+  std::string bytes;
+  for (int b = 0; b < 256; ++b) bytes.push_back(static_cast<char>(b));
+  const UString every(bytes, UString::kSystemEncoding);
+  ASSERT_EQ(every.length(), 256u);
+  for (int b : {0x81, 0x8D, 0x8F, 0x90, 0x9D}) EXPECT_EQ(every[b], b);
+  EXPECT_EQ(every.string(UString::kSystemEncoding), bytes);
   // Multiple encodings read as the system encoding.
   EXPECT_EQ(UnitsOf(UString("\x80", UString::kMultipleEncodings)), Units{0x20AC});
 }
@@ -115,6 +123,24 @@ TEST(UStringEncoding, MultipleEncodingsOutputIsEmpty) {
 TEST(UStringEncoding, UnknownEncodingThrows) {
   EXPECT_THROW(UString("a", static_cast<UString::ByteEncoding>(5)), TarnError);
   EXPECT_THROW((void)UString("a").string(static_cast<UString::ByteEncoding>(-1)), TarnError);
+}
+
+TEST(UStringEncoding, NullSourcesReadAsEmpty) {
+  const char* nullBytes = nullptr;
+  const unsigned short* nullUnits = nullptr;
+  const wchar_t* nullWide = nullptr;
+  const unsigned char* nullPascal = nullptr;
+  EXPECT_TRUE(UString(nullBytes).empty());
+  EXPECT_TRUE(UString(nullUnits).empty());
+  EXPECT_TRUE(UString(nullWide).empty());
+  EXPECT_TRUE(UString(nullPascal).empty());
+  EXPECT_TRUE(UString(nullBytes, 0, UString::kMacRomanEncoding).empty());
+  UString s("x");
+  s.append(nullBytes).append(nullUnits, 0).append(nullWide).append(nullPascal);
+  EXPECT_EQ(s, UString("x"));
+  EXPECT_THROW(UString(nullBytes, 3), TarnError);
+  EXPECT_THROW(s.append(nullUnits, 1), TarnError);
+  EXPECT_EQ(s, UString("x"));
 }
 
 TEST(UStringEncoding, StopAtNulEndsTheByteString) {
