@@ -201,6 +201,29 @@ TEST(CircularBuffer, WrapAroundKeepsOrderForEveryStartOffset) {
   }
 }
 
+TEST(CircularBuffer, TypedRecordsRoundTripAcrossTheEnd) {
+  struct Sample {
+    double left;
+    double right;
+  };
+  CircularBuffer b(sizeof(Sample), 3);
+  CircularBuffer::WriteTransaction w(b);
+  CircularBuffer::ReadTransaction r(b);
+  for (int i = 0; i < 10; ++i) {
+    ASSERT_TRUE(b.WriteRecord(w, Sample{i + 0.5, -i - 0.25}));
+    ASSERT_TRUE(b.WriteRecord(w, Sample{i + 0.75, 0.0}));
+    b.Commit(w);
+    Sample s{};
+    ASSERT_TRUE(b.ReadRecord(r, s));
+    EXPECT_EQ(s.left, i + 0.5);
+    EXPECT_EQ(s.right, -i - 0.25);
+    ASSERT_TRUE(b.ReadRecord(r, s));
+    EXPECT_EQ(s.left, i + 0.75);
+    EXPECT_FALSE(b.ReadRecord(r, s));
+    b.Commit(r);
+  }
+}
+
 TEST(CircularBuffer, SetEmptyDiscardsUnread) {
   CircularBuffer b(4, 5);
   for (int32_t i = 0; i < 4; ++i) Put(b, i);
