@@ -1,5 +1,6 @@
 #include "tarn/Threads/CircularBuffer.h"
 
+#include <cstdlib>
 #include <cstring>
 #include <new>
 
@@ -7,16 +8,6 @@
 #include "tarn/Errors/TarnAssert.h"
 
 namespace tarn {
-
-CircularBuffer::ReadTransaction::ReadTransaction(const CircularBuffer& buffer) noexcept
-    : fWorking(buffer.fRead.load(std::memory_order_relaxed)), fSaved(fWorking) {
-  buffer.AssertInvariants();
-}
-
-CircularBuffer::WriteTransaction::WriteTransaction(const CircularBuffer& buffer) noexcept
-    : fWorking(buffer.fWrite.load(std::memory_order_relaxed)), fSaved(fWorking) {
-  buffer.AssertInvariants();
-}
 
 CircularBuffer::CircularBuffer(int32_t recordSize, int16_t capacity)
     : fStart(nullptr), fEnd(nullptr), fRecordSize(recordSize), fOwnsStorage(true) {
@@ -50,6 +41,11 @@ CircularBuffer::CircularBuffer(const CircularBuffer& other) noexcept
 
 CircularBuffer::~CircularBuffer() {
   if (fOwnsStorage) delete[] fStart;
+}
+
+void CircularBuffer::RecordSizeMismatch() noexcept {
+  TARN_ASSERT_MSG(false, "CircularBuffer: record type size differs from the record size");
+  std::abort();
 }
 
 void CircularBuffer::AssertInvariants() const noexcept {

@@ -24,6 +24,7 @@
 #include <cstdint>
 #include <cstring>
 #include <memory>
+#include <new>
 #include <type_traits>
 
 #include "tarn/Errors/TarnAssert.h"
@@ -36,7 +37,8 @@ class alignas(64) CircularBuffer {
   // the last commit. Begins at the buffer's committed read pointer.
   class ReadTransaction {
    public:
-    explicit ReadTransaction(const CircularBuffer& buffer) noexcept;
+    explicit ReadTransaction(const CircularBuffer& buffer) noexcept
+        : fWorking(buffer.fRead.load(std::memory_order_relaxed)), fSaved(fWorking) {}
     ReadTransaction(const ReadTransaction&) = default;
     ReadTransaction& operator=(const ReadTransaction&) = default;
     ~ReadTransaction() = default;
@@ -50,7 +52,8 @@ class alignas(64) CircularBuffer {
   // A cursor of the producer. Begins at the buffer's committed write pointer.
   class WriteTransaction {
    public:
-    explicit WriteTransaction(const CircularBuffer& buffer) noexcept;
+    explicit WriteTransaction(const CircularBuffer& buffer) noexcept
+        : fWorking(buffer.fWrite.load(std::memory_order_relaxed)), fSaved(fWorking) {}
     WriteTransaction(const WriteTransaction&) = default;
     WriteTransaction& operator=(const WriteTransaction&) = default;
     ~WriteTransaction() = default;
@@ -90,26 +93,29 @@ class alignas(64) CircularBuffer {
     return true;
   }
   // Typed forms of Write and Read for a trivially copyable T whose size is
-  // the record size: the copy has a size known at compile time.
+  // the record size: the copy is a typed load or store of known size. Slots
+  // are aligned for any T whose size is the record size.
   template <class T>
   bool WriteRecord(WriteTransaction& t, const T& record) noexcept {
     static_assert(std::is_trivially_copyable_v<T>);
-    TARN_ASSERT(sizeof(T) == static_cast<std::size_t>(fRecordSize));
+    if (sizeof(T) != static_cast<std::size_t>(fRecordSize)) [[unlikely]]
+      RecordSizeMismatch();
     char* const at = t.fWorking;
     char* const next = BumpPtr(at);
     if (!HasRoomBefore(next)) return false;
-    std::memcpy(at, &record, sizeof(T));
+    ::new (static_cast<void*>(at)) T(record);  // a typed store: no char aliasing
     t.fWorking = next;
     return true;
   }
   template <class T>
   bool ReadRecord(ReadTransaction& t, T& record) noexcept {
     static_assert(std::is_trivially_copyable_v<T>);
-    TARN_ASSERT(sizeof(T) == static_cast<std::size_t>(fRecordSize));
+    if (sizeof(T) != static_cast<std::size_t>(fRecordSize)) [[unlikely]]
+      RecordSizeMismatch();
     char* const at = t.fWorking;
     if (!HasRecordAt(at)) return false;
     char* const next = BumpPtr(at);
-    std::memcpy(&record, at, sizeof(T));
+    record = *std::launder(reinterpret_cast<const T*>(at));
     t.fWorking = next;
     return true;
   }
@@ -125,12 +131,14 @@ class alignas(64) CircularBuffer {
 
   // Publishes the transaction's records (write) or frees their slots (read).
   void Commit(WriteTransaction& t) noexcept {
-    fWrite.store(t.fWorking, std::memory_order_release);
-    t.fSaved = t.fWorking;
+    char* const at = t.fWorking;
+    t.fSaved = at;
+    fWrite.store(at, std::memory_order_release);
   }
   void Commit(ReadTransaction& t) noexcept {
-    fRead.store(t.fWorking, std::memory_order_release);
-    t.fSaved = t.fWorking;
+    char* const at = t.fWorking;
+    t.fSaved = at;
+    fRead.store(at, std::memory_order_release);
   }
   // Rewinds the transaction to its last commit.
   void Abort(WriteTransaction& t) noexcept { t.fWorking = t.fSaved; }
@@ -190,8 +198,12 @@ class alignas(64) CircularBuffer {
     std::memcpy(to, from, static_cast<std::size_t>(fRecordSize));
   }
 
+  // Reports a typed access whose type does not have the record size to the
+  // assertion handler and ends the process (it would run past the slot).
+  [[noreturn]] static void RecordSizeMismatch() noexcept;
+
   // Checks the invariants below; called off the per-record paths (at
-  // construction, SetEmpty, CopyAndResize, and when a transaction begins).
+  // construction, SetEmpty and CopyAndResize).
   void AssertInvariants() const noexcept;
 
   // Invariants (n = (fEnd - fStart) / fRecordSize slots, capacity = n - 1):
