@@ -117,9 +117,15 @@ class CIdleChoreGlobalState {
   CIdleChore* fRunning = nullptr;
 };
 
+CIdleChore::CIdleChore() { (void)Singleton<CIdleChoreGlobalState>::Instance(); }
+
 CIdleChore::~CIdleChore() { Cancel(); }
 
-void CIdleChore::Assign() { Singleton<CIdleChoreGlobalState>::Instance().Assign(this); }
+void CIdleChore::Assign() {
+  // During unload, after the list is gone, there is no main loop left to run
+  // the chore.
+  if (auto* state = Singleton<CIdleChoreGlobalState>::InstanceIfExists()) state->Assign(this);
+}
 
 void CIdleChore::Cancel() noexcept {
   if (auto* state = Singleton<CIdleChoreGlobalState>::InstanceIfExists()) state->Cancel(this);

@@ -27,7 +27,9 @@ namespace tarn {
 
 class CIdleChore {
  public:
-  CIdleChore() = default;
+  // Makes sure the process-wide chore list exists, so that it outlives
+  // every process-wide object that owns a chore.
+  CIdleChore();
   CIdleChore(const CIdleChore&) = delete;
   CIdleChore& operator=(const CIdleChore&) = delete;
   // Cancels; derived classes call Cancel() in their own destructors too.
