@@ -76,6 +76,27 @@ TEST(CIdleChore, RescheduledFromInsideRunsOnTheNextPass) {
   EXPECT_EQ(a.runs, 3);
 }
 
+class ThrowingChore : public CIdleChore {
+ public:
+  ~ThrowingChore() override { Cancel(); }
+
+ protected:
+  void Action() override { throw TarnError("K", "S", "Sub", 7, "chore failed"); }
+};
+
+TEST(CIdleChore, ErrorInAChoreIsPrintedAndThePumpCarriesOn) {
+  RunIdleChores();
+  ThrowingChore bad;
+  CountingChore good;
+  bad.Assign();
+  good.Assign();
+  testing::internal::CaptureStderr();
+  EXPECT_EQ(RunIdleChores(), 2);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            "Unhandled exception: K S Sub 7 chore failed\n");
+  EXPECT_EQ(good.runs, 1);
+}
+
 TEST(CIdleChore, OnlyTheMainThreadMayPump) {
   RunIdleChores();
   std::atomic<int> code{0};
