@@ -9,13 +9,20 @@
 
 namespace tarn {
 
+namespace {
+constexpr std::align_val_t kStorageAlignment{64};
+}  // namespace
+
 CircularBuffer::CircularBuffer(int32_t recordSize, int16_t capacity)
     : fStart(nullptr), fEnd(nullptr), fRecordSize(recordSize), fOwnsStorage(true) {
   // One slot always stays empty; the slot count is a 16-bit quantity.
   const auto slots = static_cast<int16_t>(capacity + 1);
   if (recordSize < 1 || slots < 1) FailOSErr(-50);
   const std::size_t bytes = static_cast<std::size_t>(recordSize) * static_cast<std::size_t>(slots);
-  fStart = new (std::nothrow) char[bytes];
+  // Cache-line aligned, so that a record whose size is a multiple of the line
+  // never shares a line with its neighbours (the producer writes one while the
+  // consumer reads the other).
+  fStart = static_cast<char*>(::operator new[](bytes, kStorageAlignment, std::nothrow));
   if (fStart == nullptr) FailMemFullError();
   std::memset(fStart, 0, bytes);
   fEnd = fStart + bytes;
@@ -40,7 +47,7 @@ CircularBuffer::CircularBuffer(const CircularBuffer& other) noexcept
 }
 
 CircularBuffer::~CircularBuffer() {
-  if (fOwnsStorage) delete[] fStart;
+  if (fOwnsStorage) ::operator delete[](fStart, kStorageAlignment);
 }
 
 void CircularBuffer::RecordSizeMismatch() noexcept {
