@@ -9,11 +9,15 @@
 // a ReadTransaction are released to the producer only at Commit. Abort rewinds
 // the transaction to its last commit and leaves the buffer unchanged.
 //
-//   // producer thread                     // consumer thread
-//   CircularBuffer::WriteTransaction w(b);  CircularBuffer::ReadTransaction r(b);
-//   if (b.Write(w, &rec1) && b.Write(w, &rec2))  while (b.Read(r, &out)) Use(out);
-//     b.Commit(w);                          b.Commit(r);
-//   else b.Abort(w);
+//   // producer thread
+//   CircularBuffer::WriteTransaction w(buffer);
+//   if (buffer.WriteRecord(w, noteOn) && buffer.WriteRecord(w, noteOff)) buffer.Commit(w);
+//   else buffer.Abort(w);                    // both records or neither
+//
+//   // consumer thread
+//   CircularBuffer::ReadTransaction r(buffer);
+//   for (Event e; buffer.ReadRecord(r, e);) Play(e);
+//   buffer.Commit(r);                        // frees the slots for the producer
 //
 // Threads: Write, Commit/Abort of a WriteTransaction and IsFull belong to the
 // producer; Read, Snoop, Commit/Abort of a ReadTransaction, SetEmpty and
