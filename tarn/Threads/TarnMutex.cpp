@@ -12,37 +12,19 @@ using threads_detail::Demand;
 
 // --- TarnCoreRecursiveMutex ---
 
-void TarnCoreRecursiveMutex::lock() const noexcept {
-  if (fOwner.IsCurrent()) {
-    ++fDepth;
-    return;
-  }
-  if (AtomicAdd32Implementation(&fLockCount, 1) >= 1) fWake.wait();
-  fOwner = TarnThreadID::CurrentThread();
-  fDepth = 0;
-}
-
 bool TarnCoreRecursiveMutex::tryLock() const noexcept {
-  if (AtomicCompareAndSwap32(&fLockCount, 0, 1)) {
-    fOwner = TarnThreadID::CurrentThread();
+  const uint32_t self = TarnThreadID::CurrentThreadRawID();
+  int32_t expected = 0;
+  if (fLockCount.compare_exchange_strong(expected, 1, std::memory_order_acquire)) {
+    fOwnerID.store(self, std::memory_order_relaxed);
     fDepth = 0;
     return true;
   }
-  if (fOwner.IsCurrent()) {
+  if (fOwnerID.load(std::memory_order_relaxed) == self) {
     ++fDepth;
     return true;
   }
   return false;
-}
-
-void TarnCoreRecursiveMutex::unlock() const noexcept {
-  if (!fOwner.IsCurrent()) return;
-  if (fDepth >= 1) {
-    --fDepth;
-    return;
-  }
-  fOwner.Invalidate();
-  if (AtomicAdd32Implementation(&fLockCount, -1) > 1) fWake.signal();
 }
 
 void TarnCoreRecursiveMutex::lock(TarnMutexLockTag* tag) const noexcept {

@@ -15,6 +15,8 @@
 //   tag.unlock(tag.locked, tag.mutex);
 #pragma once
 
+#include <atomic>
+
 #include <cstdint>
 
 #include "tarn/Threads/TarnSemaphore.h"
@@ -64,9 +66,28 @@ class TarnCoreRecursiveMutex {
   TarnCoreRecursiveMutex(const TarnCoreRecursiveMutex&) = delete;
   TarnCoreRecursiveMutex& operator=(const TarnCoreRecursiveMutex&) = delete;
 
-  void lock() const noexcept;
+  // Uncontended, lock and unlock are one atomic add each and no call.
+  void lock() const noexcept {
+    const uint32_t self = TarnThreadID::CurrentThreadRawID();
+    if (fOwnerID.load(std::memory_order_relaxed) == self) {
+      ++fDepth;
+      return;
+    }
+    if (fLockCount.fetch_add(1, std::memory_order_acquire) >= 1) fWake.wait();
+    fOwnerID.store(self, std::memory_order_relaxed);
+    fDepth = 0;
+  }
   [[nodiscard]] bool tryLock() const noexcept;
-  void unlock() const noexcept;
+  // Ignored when the calling thread does not hold the lock.
+  void unlock() const noexcept {
+    if (fOwnerID.load(std::memory_order_relaxed) != TarnThreadID::CurrentThreadRawID()) return;
+    if (fDepth >= 1) {
+      --fDepth;
+      return;
+    }
+    fOwnerID.store(0, std::memory_order_relaxed);
+    if (fLockCount.fetch_sub(1, std::memory_order_release) > 1) fWake.signal();
+  }
   void lock(TarnMutexLockTag* tag) const noexcept;
   bool tryLock(TarnMutexLockTag* tag) const noexcept;
   static void unlockMutex(bool locked, void* mutex) noexcept;
@@ -76,11 +97,13 @@ class TarnCoreRecursiveMutex {
 
  private:
   // fLockCount == number of threads holding or waiting for the lock (the
-  // holder counts once however deep its recursion is).
-  mutable volatile int32_t fLockCount = 0;
+  // holder counts once however deep its recursion is). fOwnerID is the
+  // holder's raw thread id, 0 while free; only the holder writes it, so a
+  // thread comparing it with its own id sees either its own id or not.
+  mutable std::atomic<int32_t> fLockCount{0};
+  mutable std::atomic<uint32_t> fOwnerID{0};
   mutable TarnSemaphore fWake;
   mutable int32_t fDepth = 0;  // extra acquisitions by the owner; owner-only
-  mutable TarnThreadID fOwner;
   Tester fTester = nullptr;
 };
 

@@ -10,6 +10,10 @@
 
 namespace tarn {
 
+namespace detail {
+thread_local constinit uint32_t tCurrentThreadRawID TARN_TLS_INITIAL_EXEC = 0;
+}  // namespace detail
+
 namespace {
 
 std::atomic<TarnThreadID::ExceptionHandler> gExceptionHandler{nullptr};

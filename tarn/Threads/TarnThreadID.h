@@ -18,9 +18,25 @@
 #include <atomic>
 #include <cstdint>
 
+// The calling thread's id lives in a thread-local read straight off the
+// thread pointer (initial-exec), so that locks can compare owners without a
+// call.
+#if defined(_WIN32)
+#define TARN_TLS_INITIAL_EXEC
+#else
+#define TARN_TLS_INITIAL_EXEC __attribute__((tls_model("initial-exec")))
+#endif
+
 namespace tarn {
 
 class TarnSemaphore;
+
+namespace detail {
+// The calling thread's raw id, 0 until its first use on that thread.
+extern thread_local constinit uint32_t tCurrentThreadRawID TARN_TLS_INITIAL_EXEC;
+// Gives the calling thread its raw id and returns it.
+uint32_t AssignCurrentThreadRawID() noexcept;
+}  // namespace detail
 
 class TarnThreadID {
  public:
@@ -68,7 +84,10 @@ class TarnThreadID {
 
   // The calling thread, with no handle.
   [[nodiscard]] static TarnThreadID CurrentThread() noexcept;
-  [[nodiscard]] static uint32_t CurrentThreadRawID() noexcept;
+  [[nodiscard]] static uint32_t CurrentThreadRawID() noexcept {
+    const uint32_t id = detail::tCurrentThreadRawID;
+    return id != 0 ? id : detail::AssignCurrentThreadRawID();
+  }
 
   [[nodiscard]] uint32_t GetID() const noexcept { return fID.load(std::memory_order_relaxed); }
   [[nodiscard]] bool IsValid() const noexcept { return GetID() != 0; }

@@ -26,7 +26,6 @@ namespace tarn {
 namespace {
 
 std::atomic<uint32_t> gNextThreadID{1};
-thread_local uint32_t tThreadID = 0;
 
 uint32_t NextThreadID() noexcept {
   uint32_t id = gNextThreadID.fetch_add(1);
@@ -157,7 +156,7 @@ struct ThreadStartArgs {
 void* StartRoutine(void* rawArgs) {
   auto* args = static_cast<ThreadStartArgs*>(rawArgs);
   ThreadRecord* record = args->record;
-  tThreadID = record->id;
+  detail::tCurrentThreadRawID = record->id;
   tOwnRecord = record;
   record->kernelID = KernelThreadID();
   uint32_t exitCode = 0;
@@ -179,9 +178,8 @@ void* StartRoutine(void* rawArgs) {
 
 }  // namespace
 
-uint32_t TarnThreadID::CurrentThreadRawID() noexcept {
-  if (tThreadID == 0) tThreadID = NextThreadID();
-  return tThreadID;
+uint32_t detail::AssignCurrentThreadRawID() noexcept {
+  return tCurrentThreadRawID = NextThreadID();
 }
 
 TarnThreadID TarnThreadID::CurrentThread() noexcept { return TarnThreadID(CurrentThreadRawID()); }

@@ -42,7 +42,9 @@ DWORD WINAPI StartRoutine(void* rawArgs) {
 
 }  // namespace
 
-uint32_t TarnThreadID::CurrentThreadRawID() noexcept { return GetCurrentThreadId(); }
+uint32_t detail::AssignCurrentThreadRawID() noexcept {
+  return tCurrentThreadRawID = GetCurrentThreadId();
+}
 
 TarnThreadID TarnThreadID::CurrentThread() noexcept { return TarnThreadID(GetCurrentThreadId()); }
 
