@@ -1,6 +1,6 @@
 // A file on disk, named by a FileSpecification.
 //
-// `File` is a small value: it holds the specification and does I/O only when
+// `File` is a small value: it holds the FileSpecification and does I/O only when
 // asked. Every failing operation throws a `TarnError` carrying the system's
 // error: kind "Windows" with the Windows error code on Windows, kind "POSIX"
 // with errno on POSIX. Paths with characters outside the system code page

@@ -1,6 +1,6 @@
 // A file's modification date: seconds and nanoseconds since 1970-01-01 UTC.
 //
-// Read and set through `FileDate::Get` / `FileDate::Set` on a specification.
+// Read and set through `FileDate::Get` / `FileDate::Set` on a FileSpecification.
 // The file systems keep dates at their own resolution (100 ns on Windows), so
 // a date read back after Set may be rounded down to that resolution.
 #pragma once

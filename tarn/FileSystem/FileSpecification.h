@@ -5,14 +5,14 @@
 // a handle class: it owns one private implementation object that holds the
 // full path as a `UString` (UTF-16; on POSIX the path's bytes are its UTF-8
 // form). Copying copies the path; `operator==` compares the paths exactly.
-// A moved-from specification has no implementation: using it is an assertion
+// A moved-from FileSpecification has no implementation: using it is an assertion
 // failure ("px != 0"), as with any handle class of the library.
 //
 // Separators: "/" on POSIX; "\" (and "/", accepted on input) on Windows. A
 // trailing separator is dropped on construction (except from a root), so
 // "/a/b/" and "/a/b" name the same folder.
 //
-// Thread safety: a specification is a value; distinct objects may be used on
+// Thread safety: a FileSpecification is a value; distinct objects may be used on
 // distinct threads freely. Queries do file-system I/O and block accordingly.
 #pragma once
 
@@ -25,7 +25,7 @@ namespace tarn {
 
 // What a constructor does when nothing exists at the path.
 enum MissingFileSpec : int {
-  kMissingFileSpecAllowed = 0,  // keep the specification (the usual case: a file to create)
+  kMissingFileSpecAllowed = 0,  // keep the path (the usual case: a file to create)
   kMissingFileSpecFails = 1,    // throw FailFSErr(-43, spec) (file not found)
 };
 
@@ -77,7 +77,7 @@ class FileSpecification {
   [[nodiscard]] bool IsVolume() const;       // the path is a root
   [[nodiscard]] bool IsApplication() const;  // an existing file named *.exe
 
-  // Gives the specification a name at which no object of the mode's kind
+  // Gives the file a name at which no object of the mode's kind
   // exists: "Take.wav" becomes "Take 2.wav", "Take 3.wav", ... Names made
   // here never exceed kMaxNameLength units; the base is cut to make room.
   // MakeUnique splits the current name at its last "." to keep the
