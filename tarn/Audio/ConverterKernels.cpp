@@ -1,0 +1,366 @@
+// Vector kernels of the buffer converter, written once with the compiler's
+// generic vector types and compiled per instruction set. Every lane operation
+// is the IEEE or two's-complement operation of the per-sample rule it stands
+// for, so results match ConverterRules.h bit for bit:
+// - integer to float: the integer converts exactly (16-bit) or with one
+//   round-to-nearest (24-bit words), and the scale is a power of two, so the
+//   product equals the exact quotient rounded once, as the rules require;
+// - float to integer: the rule's double-precision arithmetic, lane by lane,
+//   with the clamp done before the truncating conversion;
+// - dither: each lane runs the generator from its own starting point, found
+//   by jumping the linear congruence ahead, so lane k of a group draws the
+//   value the scalar generator would draw for sample k of that group.
+#include "tarn/Audio/ConverterKernels.h"
+
+#include <atomic>
+#include <cstring>
+
+#include "tarn/Audio/ConverterRules.h"
+
+#if defined(__GNUC__) && !defined(__clang__)
+// The 32-byte vector types below never cross a function boundary outside the
+// always-inlined kernel bodies, so the ABI note does not apply.
+#pragma GCC diagnostic ignored "-Wpsabi"
+#endif
+
+// GCC cannot keep 32-byte stack slots aligned on 64-bit Windows, so the AVX2
+// kernels are built for the other x86-64 targets only.
+#if defined(__x86_64__) && !defined(_WIN32)
+#define TARN_CONVERTER_AVX2 1
+#else
+#define TARN_CONVERTER_AVX2 0
+#endif
+
+namespace tarn::ConverterKernels {
+namespace {
+
+using namespace ConverterRules;
+
+template <int V>
+struct Lanes;
+
+template <>
+struct Lanes<4> {
+  typedef std::int32_t I32 __attribute__((vector_size(16)));
+  typedef std::uint32_t U32 __attribute__((vector_size(16)));
+  typedef float F32 __attribute__((vector_size(16)));
+  typedef float F32h __attribute__((vector_size(8)));
+  typedef std::int32_t I32h __attribute__((vector_size(8)));
+  typedef double F64h __attribute__((vector_size(16)));
+  typedef std::int16_t I16 __attribute__((vector_size(8)));
+  typedef std::int8_t I8 __attribute__((vector_size(4)));
+  typedef std::uint8_t B __attribute__((vector_size(16)));
+};
+
+template <>
+struct Lanes<8> {
+  typedef std::int32_t I32 __attribute__((vector_size(32)));
+  typedef std::uint32_t U32 __attribute__((vector_size(32)));
+  typedef float F32 __attribute__((vector_size(32)));
+  typedef float F32h __attribute__((vector_size(16)));
+  typedef std::int32_t I32h __attribute__((vector_size(16)));
+  typedef double F64h __attribute__((vector_size(32)));
+  typedef std::int16_t I16 __attribute__((vector_size(16)));
+  typedef std::int8_t I8 __attribute__((vector_size(8)));
+  typedef std::uint8_t B __attribute__((vector_size(32)));
+};
+
+#define TARN_INLINE [[gnu::always_inline]] inline
+
+template <class T, class S>
+TARN_INLINE T Splat(S s) {
+  T v = {};
+  return v + s;
+}
+
+// Lane-wise mask ? a : b, the mask being the result of a vector comparison.
+template <class T, class M>
+TARN_INLINE T Select(const M& mask, const T& a, const T& b) {
+  return (T)(((M)a & mask) | ((M)b & ~mask));
+}
+
+template <int V>
+TARN_INLINE typename Lanes<V>::B PackedToWords(const typename Lanes<V>::B& b) {
+  const typename Lanes<V>::B z = {};
+  if constexpr (V == 4) {
+    return __builtin_shufflevector(b, z, 16, 0, 1, 2, 16, 3, 4, 5, 16, 6, 7, 8, 16, 9, 10, 11);
+  } else {
+    return __builtin_shufflevector(b, z, 32, 0, 1, 2, 32, 3, 4, 5, 32, 6, 7, 8, 32, 9, 10, 11, 32,
+                                   12, 13, 14, 32, 15, 16, 17, 32, 18, 19, 20, 32, 21, 22, 23);
+  }
+}
+
+template <int V>
+TARN_INLINE typename Lanes<V>::B WordsToPacked(const typename Lanes<V>::B& w) {
+  if constexpr (V == 4) {
+    return __builtin_shufflevector(w, w, 1, 2, 3, 5, 6, 7, 9, 10, 11, 13, 14, 15, 0, 0, 0, 0);
+  } else {
+    return __builtin_shufflevector(w, w, 1, 2, 3, 5, 6, 7, 9, 10, 11, 13, 14, 15, 17, 18, 19, 21,
+                                   22, 23, 25, 26, 27, 29, 30, 31, 0, 0, 0, 0, 0, 0, 0, 0);
+  }
+}
+
+template <int V>
+TARN_INLINE typename Lanes<V>::F32h LowHalf(const typename Lanes<V>::F32& f) {
+  if constexpr (V == 4)
+    return __builtin_shufflevector(f, f, 0, 1);
+  else
+    return __builtin_shufflevector(f, f, 0, 1, 2, 3);
+}
+template <int V>
+TARN_INLINE typename Lanes<V>::F32h HighHalf(const typename Lanes<V>::F32& f) {
+  if constexpr (V == 4)
+    return __builtin_shufflevector(f, f, 2, 3);
+  else
+    return __builtin_shufflevector(f, f, 4, 5, 6, 7);
+}
+template <int V>
+TARN_INLINE typename Lanes<V>::I32 Join(const typename Lanes<V>::I32h& a,
+                                        const typename Lanes<V>::I32h& b) {
+  if constexpr (V == 4)
+    return __builtin_shufflevector(a, b, 0, 1, 2, 3);
+  else
+    return __builtin_shufflevector(a, b, 0, 1, 2, 3, 4, 5, 6, 7);
+}
+
+// Reads V samples as canonical lanes (int32 or float).
+template <int V, class Src>
+TARN_INLINE auto Load(const std::uint8_t* p) {
+  using L = Lanes<V>;
+  if constexpr (Src::kBytes == 1) {
+    typename L::I8 b;
+    std::memcpy(&b, p, sizeof b);
+    if constexpr (Src::kFormat == kSamp8Offset) b ^= static_cast<std::int8_t>(-128);
+    return __builtin_convertvector(b, typename L::I32);
+  } else if constexpr (Src::kBytes == 2) {
+    typename L::I16 h;
+    std::memcpy(&h, p, sizeof h);
+    return __builtin_convertvector(h, typename L::I32);
+  } else if constexpr (Src::kBytes == 3) {
+    typename L::B b;  // reads V bytes past the group; the caller leaves room
+    std::memcpy(&b, p, sizeof b);
+    return (typename L::I32)PackedToWords<V>(b);
+  } else if constexpr (Src::kKind == Kind::k24) {
+    typename L::I32 w;
+    std::memcpy(&w, p, sizeof w);
+    return w;
+  } else {
+    typename L::F32 f;
+    std::memcpy(&f, p, sizeof f);
+    return f;
+  }
+}
+
+template <int V, class Dst, class T>
+TARN_INLINE void Store(std::uint8_t* p, const T& v) {
+  using L = Lanes<V>;
+  if constexpr (Dst::kBytes == 1) {
+    typename L::I8 b = __builtin_convertvector(v, typename L::I8);
+    if constexpr (Dst::kFormat == kSamp8Offset) b ^= static_cast<std::int8_t>(-128);
+    std::memcpy(p, &b, sizeof b);
+  } else if constexpr (Dst::kBytes == 2) {
+    const typename L::I16 h = __builtin_convertvector(v, typename L::I16);
+    std::memcpy(p, &h, sizeof h);
+  } else if constexpr (Dst::kBytes == 3) {
+    const typename L::B b = WordsToPacked<V>((typename L::B)v);
+    std::memcpy(p, &b, 3 * V);
+  } else {
+    std::memcpy(p, &v, sizeof v);
+  }
+}
+
+template <int V>
+TARN_INLINE typename Lanes<V>::I32 ClampI(const typename Lanes<V>::I32& x, std::int32_t lo,
+                                          std::int32_t hi) {
+  using I32 = typename Lanes<V>::I32;
+  const I32 y = Select(x < Splat<I32>(lo), Splat<I32>(lo), x);
+  return Select(y > Splat<I32>(hi), Splat<I32>(hi), y);
+}
+
+// trunc(clamp(g * scale + (g < 0 ? -half : half), lo, hi)) on half a group.
+template <int V>
+TARN_INLINE typename Lanes<V>::I32h RoundClipHalf(const typename Lanes<V>::F64h& g, double scale,
+                                                  double half, double lo, double hi) {
+  using F64h = typename Lanes<V>::F64h;
+  F64h v = g * scale + Select(g < Splat<F64h>(0.0), Splat<F64h>(-half), Splat<F64h>(half));
+  v = Select(v < Splat<F64h>(lo), Splat<F64h>(lo), v);
+  v = Select(v > Splat<F64h>(hi), Splat<F64h>(hi), v);
+  return __builtin_convertvector(v, typename Lanes<V>::I32h);
+}
+
+template <int V, bool kDither>
+TARN_INLINE typename Lanes<V>::I32 FloatToInt(const typename Lanes<V>::F32& f,
+                                              const typename Lanes<V>::I32& d, double scale,
+                                              double half, double lo, double hi) {
+  using L = Lanes<V>;
+  const typename L::F32 g = Select(f == f, f, Splat<typename L::F32>(0.0f));  // NaN as 0.0
+  typename L::F64h glo = __builtin_convertvector(LowHalf<V>(g), typename L::F64h);
+  typename L::F64h ghi = __builtin_convertvector(HighHalf<V>(g), typename L::F64h);
+  if constexpr (kDither) {
+    const typename L::F32 df = __builtin_convertvector(d, typename L::F32);  // |d| < 2^17: exact
+    glo += __builtin_convertvector(LowHalf<V>(df), typename L::F64h) * kFloatDitherScale;
+    ghi += __builtin_convertvector(HighHalf<V>(df), typename L::F64h) * kFloatDitherScale;
+  }
+  return Join<V>(RoundClipHalf<V>(glo, scale, half, lo, hi),
+                 RoundClipHalf<V>(ghi, scale, half, lo, hi));
+}
+
+// Generator jump: j steps map state s to a * s + c.
+struct Jump {
+  std::uint32_t a = 1, c = 0;
+};
+constexpr Jump JumpOf(int steps) {
+  Jump j;
+  for (int k = 0; k < steps; ++k) {
+    j.a *= 1664525u;
+    j.c = j.c * 1664525u + 1013904223u;
+  }
+  return j;
+}
+
+template <int V, class Src, class Dst, bool kDither>
+TARN_INLINE int Body(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) {
+  using L = Lanes<V>;
+  using I32 = typename L::I32;
+  using U32 = typename L::U32;
+  using F32 = typename L::F32;
+  constexpr Kind from = Src::kKind, to = Dst::kKind;
+  constexpr bool kPacked = Src::kBytes == 3 || Dst::kBytes == 3;
+  const int last = n - (kPacked ? 2 * V : V);
+
+  U32 s0 = {};
+  if constexpr (kDither) {
+    for (int k = 0; k < V; ++k) {
+      const Jump j = JumpOf(2 * k);
+      s0[k] = j.a * *state + j.c;
+    }
+  }
+  constexpr Jump kOne = JumpOf(1), kGroup = JumpOf(2 * V);
+
+  int i = 0;
+  for (; i <= last; i += V) {
+    const auto x = Load<V, Src>(s + static_cast<std::ptrdiff_t>(i) * Src::kBytes);
+    std::uint8_t* out = d + static_cast<std::ptrdiff_t>(i) * Dst::kBytes;
+    I32 r = {};
+    if constexpr (kDither) {
+      const U32 s1 = s0 * kOne.a + kOne.c;
+      r = ((I32)s1 >> 16) + ((I32)s0 >> 16);
+      s0 = s0 * kGroup.a + kGroup.c;
+    }
+    if constexpr (to == Kind::kFloat) {
+      F32 y = __builtin_convertvector(x, F32);
+      if constexpr (from == Kind::k8)
+        y *= 0.0078125f;
+      else if constexpr (from == Kind::k16)
+        y *= 1.0f / 32768.0f;
+      else
+        y *= 1.0f / 2147483648.0f;
+      Store<V, Dst>(out, y);
+    } else if constexpr (from == Kind::kFloat) {
+      if constexpr (to == Kind::k24) {
+        Store<V, Dst>(out,
+                      FloatToInt<V, false>(x, r, 2147483648.0, 128.0, -2147483648.0, 2147483647.0) &
+                          static_cast<std::int32_t>(0xFFFFFF00u));
+      } else if constexpr (to == Kind::k16) {
+        Store<V, Dst>(out, FloatToInt<V, kDither>(x, r, 32768.0, 0.5, -32768.0, 32767.0));
+      } else {
+        Store<V, Dst>(out, FloatToInt<V, kDither>(x, r, 128.0, 0.5, -128.0, 127.0));
+      }
+    } else if constexpr (from == Kind::k8) {
+      if constexpr (to == Kind::k8) {
+        Store<V, Dst>(out, x);
+      } else {
+        const float scale = to == Kind::k16 ? 255.9921875f : 16777216.0f;
+        Store<V, Dst>(out, __builtin_convertvector(__builtin_convertvector(x, F32) * scale, I32));
+      }
+    } else if constexpr (from == Kind::k16 && to == Kind::k24) {
+      Store<V, Dst>(out, __builtin_convertvector(__builtin_convertvector(x, F32) * 65536.0f, I32));
+    } else if constexpr (from == Kind::k16) {  // to 8-bit
+      if constexpr (kDither)
+        Store<V, Dst>(out, ClampI<V>(x + (r >> 8), -32768, 32767) >> 8);
+      else
+        Store<V, Dst>(out, x >> 8);
+    } else if constexpr (to == Kind::k24) {
+      Store<V, Dst>(out, x);
+    } else if constexpr (to == Kind::k16) {
+      if constexpr (kDither)
+        Store<V, Dst>(out, ClampI<V>((x >> 8) + (r >> 8), -8388608, 8388607) >> 8);
+      else
+        Store<V, Dst>(out, x >> 16);
+    } else {  // 24-bit to 8-bit
+      if constexpr (kDither)
+        Store<V, Dst>(out, ClampI<V>((x >> 8) + r, -8388608, 8388607) >> 16);
+      else
+        Store<V, Dst>(out, x >> 24);
+    }
+  }
+  if constexpr (kDither) *state = s0[0];
+  return i;
+}
+
+template <class Src, class Dst, bool kDither>
+int RunBaseline(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) noexcept {
+  return Body<4, Src, Dst, kDither>(s, d, n, state);
+}
+
+#if TARN_CONVERTER_AVX2
+template <class Src, class Dst, bool kDither>
+__attribute__((target("avx2"))) int RunAvx2(const std::uint8_t* s, std::uint8_t* d, int n,
+                                            std::uint32_t* state) noexcept {
+  return Body<8, Src, Dst, kDither>(s, d, n, state);
+}
+
+bool CpuHasAvx2() noexcept {
+  static const bool has = [] {
+    __builtin_cpu_init();
+    return __builtin_cpu_supports("avx2") != 0;
+  }();
+  return has;
+}
+#endif
+
+std::atomic<int> gLevel{static_cast<int>(KernelLevel::kBest)};
+
+}  // namespace
+
+void SetKernelLevel(KernelLevel level) noexcept {
+  gLevel.store(static_cast<int>(level), std::memory_order_relaxed);
+}
+
+const char* InstructionSet() noexcept {
+  const int level = gLevel.load(std::memory_order_relaxed);
+  if (level == static_cast<int>(KernelLevel::kScalar)) return "scalar";
+#if TARN_CONVERTER_AVX2
+  if (level == static_cast<int>(KernelLevel::kBest) && CpuHasAvx2()) return "avx2";
+#endif
+#if defined(__x86_64__)
+  return "sse2";
+#elif defined(__aarch64__)
+  return "neon";
+#else
+  return "generic";
+#endif
+}
+
+template <class Src, class Dst, bool kDither>
+Kernel Get() noexcept {
+  const int level = gLevel.load(std::memory_order_relaxed);
+  if (level == static_cast<int>(KernelLevel::kScalar)) return nullptr;
+#if TARN_CONVERTER_AVX2
+  if (level == static_cast<int>(KernelLevel::kBest) && CpuHasAvx2()) {
+    return &RunAvx2<Src, Dst, kDither>;
+  }
+#endif
+  return &RunBaseline<Src, Dst, kDither>;
+}
+
+#define TARN_INSTANTIATE_W(S, D) template Kernel Get<S, D, false>() noexcept;
+#define TARN_INSTANTIATE_D(S, D) template Kernel Get<S, D, false>() noexcept;
+#define TARN_INSTANTIATE_N(S, D) template Kernel Get<S, D, false>() noexcept;
+#define TARN_INSTANTIATE_NT(S, D)              \
+  template Kernel Get<S, D, false>() noexcept; \
+  template Kernel Get<S, D, true>() noexcept;
+#define TARN_INSTANTIATE(S, D, family) TARN_INSTANTIATE_##family(S, D)
+TARN_CONVERTER_PAIRS(TARN_INSTANTIATE)
+
+}  // namespace tarn::ConverterKernels

@@ -1,0 +1,38 @@
+// Vector block kernels of the buffer converter (private).
+//
+// A kernel converts a prefix of a run with vector instructions and returns
+// how many samples it converted; the caller converts the rest with the
+// per-sample rules of ConverterRules.h. Every kernel produces results
+// bit-identical to those rules. Dithered kernels draw the same dither values
+// in the same order as the scalar generator and leave `*ditherState` where
+// the scalar generator would be after the converted prefix.
+//
+// The kernel for a pair is chosen once per process from the processor's
+// features (AVX2 or the SSE2 baseline on x86-64, NEON on AArch64, plain
+// vector code elsewhere).
+#pragma once
+
+#include <cstdint>
+
+namespace tarn::ConverterKernels {
+
+using Kernel = int (*)(const std::uint8_t* source, std::uint8_t* destination, int count,
+                       std::uint32_t* ditherState) noexcept;
+
+// Which kernels converters use: none (per-sample rules only), the
+// architecture's baseline vector code (SSE2, NEON, plain vector code), or the
+// best the processor supports (AVX2 where available). The default is kBest;
+// tests lower it to check every path. Takes effect for later Convert calls.
+enum class KernelLevel { kScalar = 0, kBaseline = 1, kBest = 2 };
+void SetKernelLevel(KernelLevel level) noexcept;
+
+// The kernel for a pair at the current level, or null for the per-sample
+// path. Defined for every pair the converter supports.
+template <class Src, class Dst, bool kDither>
+[[nodiscard]] Kernel Get() noexcept;
+
+// Name of the instruction set the current level runs with ("avx2", "sse2",
+// "neon", "generic", "scalar"); for benchmarks and diagnostics.
+[[nodiscard]] const char* InstructionSet() noexcept;
+
+}  // namespace tarn::ConverterKernels
