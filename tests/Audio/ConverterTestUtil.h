@@ -152,7 +152,7 @@ inline float RandomFloat(std::mt19937_64& rng) {
 
 inline std::vector<std::uint8_t> FloatBytes(const std::vector<float>& v) {
   std::vector<std::uint8_t> b(v.size() * 4);
-  std::memcpy(b.data(), v.data(), b.size());
+  if (!v.empty()) std::memcpy(b.data(), v.data(), b.size());
   return b;
 }
 
