@@ -1,4 +1,6 @@
 #include <windows.h>
+// After windows.h, which it needs.
+#include <mmsystem.h>
 
 #include "tarn/Time/TarnSystemTimeImpl.h"
 
