@@ -14,18 +14,25 @@
 
 #include <atomic>
 #include <cstring>
+#include <utility>
 
 #include "tarn/Audio/ConverterRules.h"
 
-#if defined(__GNUC__) && !defined(__clang__)
+#if defined(__GNUC__)
 // The 32-byte vector types below never cross a function boundary outside the
 // always-inlined kernel bodies, so the ABI note does not apply.
 #pragma GCC diagnostic ignored "-Wpsabi"
 #endif
 
+#if defined(__x86_64__)
+#define TARN_CONVERTER_X86 1
+#else
+#define TARN_CONVERTER_X86 0
+#endif
 // GCC cannot keep 32-byte stack slots aligned on 64-bit Windows, so the AVX2
-// kernels are built for the other x86-64 targets only.
-#if defined(__x86_64__) && !defined(_WIN32)
+// kernels are built for the other x86-64 targets only; Windows builds use
+// the SSE4.1 kernels at best.
+#if TARN_CONVERTER_X86 && !defined(_WIN32)
 #define TARN_CONVERTER_AVX2 1
 #else
 #define TARN_CONVERTER_AVX2 0
@@ -47,9 +54,9 @@ struct Lanes<4> {
   typedef float F32h __attribute__((vector_size(8)));
   typedef std::int32_t I32h __attribute__((vector_size(8)));
   typedef double F64h __attribute__((vector_size(16)));
-  typedef std::int16_t I16 __attribute__((vector_size(8)));
-  typedef std::int8_t I8 __attribute__((vector_size(4)));
   typedef std::uint8_t B __attribute__((vector_size(16)));
+  typedef std::uint8_t B1 __attribute__((vector_size(4)));
+  typedef std::uint8_t B2 __attribute__((vector_size(8)));
 };
 
 template <>
@@ -60,9 +67,9 @@ struct Lanes<8> {
   typedef float F32h __attribute__((vector_size(16)));
   typedef std::int32_t I32h __attribute__((vector_size(16)));
   typedef double F64h __attribute__((vector_size(32)));
-  typedef std::int16_t I16 __attribute__((vector_size(16)));
-  typedef std::int8_t I8 __attribute__((vector_size(8)));
   typedef std::uint8_t B __attribute__((vector_size(32)));
+  typedef std::uint8_t B1 __attribute__((vector_size(8)));
+  typedef std::uint8_t B2 __attribute__((vector_size(16)));
 };
 
 #define TARN_INLINE [[gnu::always_inline]] inline
@@ -79,26 +86,59 @@ TARN_INLINE T Select(const M& mask, const T& a, const T& b) {
   return (T)(((M)a & mask) | ((M)b & ~mask));
 }
 
-template <int V>
-TARN_INLINE typename Lanes<V>::B PackedToWords(const typename Lanes<V>::B& b) {
-  const typename Lanes<V>::B z = {};
-  if constexpr (V == 4) {
-    return __builtin_shufflevector(b, z, 16, 0, 1, 2, 16, 3, 4, 5, 16, 6, 7, 8, 16, 9, 10, 11);
-  } else {
-    return __builtin_shufflevector(b, z, 32, 0, 1, 2, 32, 3, 4, 5, 32, 6, 7, 8, 32, 9, 10, 11, 32,
-                                   12, 13, 14, 32, 15, 16, 17, 32, 18, 19, 20, 32, 21, 22, 23);
-  }
+// Byte shuffles: byte i of the result (N bytes) takes byte Map::At(i) of
+// `a`, or zero where At returns a negative index.
+template <std::size_t N, class Map, class In, std::size_t... Is>
+TARN_INLINE auto ShuffleBytes(const In& a, std::index_sequence<Is...>) {
+  constexpr int kZero = sizeof(In);
+  const In zero = {};
+  return __builtin_shufflevector(a, zero, (Map::At(Is) < 0 ? kZero : Map::At(Is))...);
+}
+template <std::size_t N, class Map, class In>
+TARN_INLINE auto ShuffleBytes(const In& a) {
+  return ShuffleBytes<N, Map>(a, std::make_index_sequence<N>());
 }
 
 template <int V>
-TARN_INLINE typename Lanes<V>::B WordsToPacked(const typename Lanes<V>::B& w) {
-  if constexpr (V == 4) {
-    return __builtin_shufflevector(w, w, 1, 2, 3, 5, 6, 7, 9, 10, 11, 13, 14, 15, 0, 0, 0, 0);
-  } else {
-    return __builtin_shufflevector(w, w, 1, 2, 3, 5, 6, 7, 9, 10, 11, 13, 14, 15, 17, 18, 19, 21,
-                                   22, 23, 25, 26, 27, 29, 30, 31, 0, 0, 0, 0, 0, 0, 0, 0);
-  }
-}
+struct ByteMaps {
+  static constexpr int kZero = -1;
+  // Byte kOff + k to the top byte of word k (then shifted down with its sign).
+  template <int kOff>
+  struct BytesToTop {
+    static constexpr int At(std::size_t i) {
+      return i % 4 == 3 ? kOff + static_cast<int>(i / 4) : kZero;
+    }
+  };
+  // 16-bit value k, from byte kOff on, to the top half of word k.
+  template <int kOff>
+  struct ShortsToTop {
+    static constexpr int At(std::size_t i) {
+      return i % 4 >= 2 ? kOff + static_cast<int>(2 * (i / 4) + i % 4 - 2) : kZero;
+    }
+  };
+  // Packed sample k to bytes 1..3 of word k, byte 0 zero.
+  struct PackedToWords {
+    static constexpr int At(std::size_t i) {
+      return i % 4 == 0 ? kZero : static_cast<int>(3 * (i / 4) + i % 4 - 1);
+    }
+  };
+  // Bytes 1..3 of every word, packed; the last V bytes are filler.
+  struct WordsToPacked {
+    static constexpr int At(std::size_t i) {
+      return i < 3 * V ? static_cast<int>(4 * (i / 3) + i % 3 + 1) : 0;
+    }
+  };
+  // The low byte of every word; the rest filler.
+  struct WordsToBytes {
+    static constexpr int At(std::size_t i) { return i < V ? static_cast<int>(4 * i) : 0; }
+  };
+  // The low half of every word; the rest filler.
+  struct WordsToShorts {
+    static constexpr int At(std::size_t i) {
+      return i < 2 * V ? static_cast<int>(4 * (i / 2) + i % 2) : 0;
+    }
+  };
+};
 
 template <int V>
 TARN_INLINE typename Lanes<V>::F32h LowHalf(const typename Lanes<V>::F32& f) {
@@ -123,23 +163,26 @@ TARN_INLINE typename Lanes<V>::I32 Join(const typename Lanes<V>::I32h& a,
     return __builtin_shufflevector(a, b, 0, 1, 2, 3, 4, 5, 6, 7);
 }
 
-// Reads V samples as canonical lanes (int32 or float).
-template <int V, class Src>
-TARN_INLINE auto Load(const std::uint8_t* p) {
+// Reads group kG of V samples as canonical lanes (int32 or float). 8- and
+// 16-bit samples come from `raw`, 4V bytes loaded once for several groups;
+// they are moved to the top of each word and shifted down, which
+// sign-extends them. Wider samples are read from `p`, the group's start.
+template <int V, class Src, int kG>
+TARN_INLINE auto Load(const std::uint8_t* p, const typename Lanes<V>::B& raw) {
   using L = Lanes<V>;
+  using M = ByteMaps<V>;
   if constexpr (Src::kBytes == 1) {
-    typename L::I8 b;
-    std::memcpy(&b, p, sizeof b);
-    if constexpr (Src::kFormat == kSamp8Offset) b ^= static_cast<std::int8_t>(-128);
-    return __builtin_convertvector(b, typename L::I32);
+    using Map = typename M::template BytesToTop<kG * V>;
+    typename L::I32 w = (typename L::I32)ShuffleBytes<4 * V, Map>(raw);
+    if constexpr (Src::kFormat == kSamp8Offset) w ^= static_cast<std::int32_t>(0x80000000u);
+    return w >> 24;
   } else if constexpr (Src::kBytes == 2) {
-    typename L::I16 h;
-    std::memcpy(&h, p, sizeof h);
-    return __builtin_convertvector(h, typename L::I32);
+    using Map = typename M::template ShortsToTop<kG * 2 * V>;
+    return (typename L::I32)ShuffleBytes<4 * V, Map>(raw) >> 16;
   } else if constexpr (Src::kBytes == 3) {
-    typename L::B b;  // reads V bytes past the group; the caller leaves room
-    std::memcpy(&b, p, sizeof b);
-    return (typename L::I32)PackedToWords<V>(b);
+    typename L::B b;
+    std::memcpy(&b, p, sizeof b);  // V bytes past the group; the caller leaves room
+    return (typename L::I32)ShuffleBytes<4 * V, typename M::PackedToWords>(b);
   } else if constexpr (Src::kKind == Kind::k24) {
     typename L::I32 w;
     std::memcpy(&w, p, sizeof w);
@@ -151,19 +194,24 @@ TARN_INLINE auto Load(const std::uint8_t* p) {
   }
 }
 
+// Writes V canonical lanes; integer lanes are already in the destination's
+// range.
 template <int V, class Dst, class T>
 TARN_INLINE void Store(std::uint8_t* p, const T& v) {
   using L = Lanes<V>;
+  using M = ByteMaps<V>;
   if constexpr (Dst::kBytes == 1) {
-    typename L::I8 b = __builtin_convertvector(v, typename L::I8);
-    if constexpr (Dst::kFormat == kSamp8Offset) b ^= static_cast<std::int8_t>(-128);
+    typename L::B1 b = ShuffleBytes<V, typename M::WordsToBytes>((typename L::B)v);
+    if constexpr (Dst::kFormat == kSamp8Offset) b ^= static_cast<std::uint8_t>(0x80);
     std::memcpy(p, &b, sizeof b);
   } else if constexpr (Dst::kBytes == 2) {
-    const typename L::I16 h = __builtin_convertvector(v, typename L::I16);
-    std::memcpy(p, &h, sizeof h);
+    const typename L::B2 b = ShuffleBytes<2 * V, typename M::WordsToShorts>((typename L::B)v);
+    std::memcpy(p, &b, sizeof b);
   } else if constexpr (Dst::kBytes == 3) {
-    const typename L::B b = WordsToPacked<V>((typename L::B)v);
-    std::memcpy(p, &b, 3 * V);
+    // Writes V filler bytes past the group, which later groups or the
+    // caller's per-sample tail overwrite; the caller leaves room.
+    const typename L::B b = ShuffleBytes<4 * V, typename M::WordsToPacked>((typename L::B)v);
+    std::memcpy(p, &b, sizeof b);
   } else {
     std::memcpy(p, &v, sizeof v);
   }
@@ -218,15 +266,90 @@ constexpr Jump JumpOf(int steps) {
   return j;
 }
 
-template <int V, class Src, class Dst, bool kDither>
-TARN_INLINE int Body(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) {
+// Converts group kG of a block: V samples.
+template <int V, class Src, class Dst, bool kDither, int kG>
+TARN_INLINE void Group(const std::uint8_t* s, std::uint8_t* d, const typename Lanes<V>::B& raw,
+                       typename Lanes<V>::U32& s0) {
   using L = Lanes<V>;
   using I32 = typename L::I32;
   using U32 = typename L::U32;
   using F32 = typename L::F32;
   constexpr Kind from = Src::kKind, to = Dst::kKind;
+  constexpr Jump kOne = JumpOf(1), kGroup = JumpOf(2 * V);
+  const auto x = Load<V, Src, kG>(s + kG * V * Src::kBytes, raw);
+  std::uint8_t* out = d + kG * V * Dst::kBytes;
+  I32 r = {};
+  if constexpr (kDither) {
+    const U32 s1 = s0 * kOne.a + kOne.c;
+    r = ((I32)s1 >> 16) + ((I32)s0 >> 16);
+    s0 = s0 * kGroup.a + kGroup.c;
+  }
+  if constexpr (to == Kind::kFloat) {
+    F32 y = __builtin_convertvector(x, F32);
+    if constexpr (from == Kind::k8)
+      y *= 0.0078125f;
+    else if constexpr (from == Kind::k16)
+      y *= 1.0f / 32768.0f;
+    else
+      y *= 1.0f / 2147483648.0f;
+    Store<V, Dst>(out, y);
+  } else if constexpr (from == Kind::kFloat) {
+    if constexpr (to == Kind::k24) {
+      Store<V, Dst>(out,
+                    FloatToInt<V, false>(x, r, 2147483648.0, 128.0, -2147483648.0, 2147483647.0) &
+                        static_cast<std::int32_t>(0xFFFFFF00u));
+    } else if constexpr (to == Kind::k16) {
+      Store<V, Dst>(out, FloatToInt<V, kDither>(x, r, 32768.0, 0.5, -32768.0, 32767.0));
+    } else {
+      Store<V, Dst>(out, FloatToInt<V, kDither>(x, r, 128.0, 0.5, -128.0, 127.0));
+    }
+  } else if constexpr (from == Kind::k8) {
+    if constexpr (to == Kind::k8) {
+      Store<V, Dst>(out, x);
+    } else {
+      const float scale = to == Kind::k16 ? 255.9921875f : 16777216.0f;
+      Store<V, Dst>(out, __builtin_convertvector(__builtin_convertvector(x, F32) * scale, I32));
+    }
+  } else if constexpr (from == Kind::k16 && to == Kind::k24) {
+    Store<V, Dst>(out, __builtin_convertvector(__builtin_convertvector(x, F32) * 65536.0f, I32));
+  } else if constexpr (from == Kind::k16) {  // to 8-bit
+    if constexpr (kDither)
+      Store<V, Dst>(out, ClampI<V>(x + (r >> 8), -32768, 32767) >> 8);
+    else
+      Store<V, Dst>(out, x >> 8);
+  } else if constexpr (to == Kind::k24) {
+    Store<V, Dst>(out, x);
+  } else if constexpr (to == Kind::k16) {
+    if constexpr (kDither)
+      Store<V, Dst>(out, ClampI<V>((x >> 8) + (r >> 8), -8388608, 8388607) >> 8);
+    else
+      Store<V, Dst>(out, x >> 16);
+  } else {  // 24-bit to 8-bit
+    if constexpr (kDither)
+      Store<V, Dst>(out, ClampI<V>((x >> 8) + r, -8388608, 8388607) >> 16);
+    else
+      Store<V, Dst>(out, x >> 24);
+  }
+}
+
+template <int V, class Src, class Dst, bool kDither, int... kGs>
+TARN_INLINE void Block(const std::uint8_t* s, std::uint8_t* d, typename Lanes<V>::U32& s0,
+                       std::integer_sequence<int, kGs...>) {
+  typename Lanes<V>::B raw = {};
+  if constexpr (Src::kBytes <= 2) std::memcpy(&raw, s, sizeof raw);
+  (Group<V, Src, Dst, kDither, kGs>(s, d, raw, s0), ...);
+}
+
+// Converts whole blocks: four groups for 8-bit sources and two for 16-bit
+// ones (one 4V-byte load each), one group otherwise.
+template <int V, class Src, class Dst, bool kDither>
+TARN_INLINE int Body(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) {
+  using U32 = typename Lanes<V>::U32;
+  constexpr int kGroups = Src::kBytes == 1 ? 4 : Src::kBytes == 2 ? 2 : 1;
   constexpr bool kPacked = Src::kBytes == 3 || Dst::kBytes == 3;
-  const int last = n - (kPacked ? 2 * V : V);
+  constexpr int kStep = kGroups * V;
+  // Packed loads and stores touch V bytes past the block.
+  const int last = n - kStep - (kPacked ? V : 0);
 
   U32 s0 = {};
   if constexpr (kDither) {
@@ -235,64 +358,11 @@ TARN_INLINE int Body(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_
       s0[k] = j.a * *state + j.c;
     }
   }
-  constexpr Jump kOne = JumpOf(1), kGroup = JumpOf(2 * V);
-
   int i = 0;
-  for (; i <= last; i += V) {
-    const auto x = Load<V, Src>(s + static_cast<std::ptrdiff_t>(i) * Src::kBytes);
-    std::uint8_t* out = d + static_cast<std::ptrdiff_t>(i) * Dst::kBytes;
-    I32 r = {};
-    if constexpr (kDither) {
-      const U32 s1 = s0 * kOne.a + kOne.c;
-      r = ((I32)s1 >> 16) + ((I32)s0 >> 16);
-      s0 = s0 * kGroup.a + kGroup.c;
-    }
-    if constexpr (to == Kind::kFloat) {
-      F32 y = __builtin_convertvector(x, F32);
-      if constexpr (from == Kind::k8)
-        y *= 0.0078125f;
-      else if constexpr (from == Kind::k16)
-        y *= 1.0f / 32768.0f;
-      else
-        y *= 1.0f / 2147483648.0f;
-      Store<V, Dst>(out, y);
-    } else if constexpr (from == Kind::kFloat) {
-      if constexpr (to == Kind::k24) {
-        Store<V, Dst>(out,
-                      FloatToInt<V, false>(x, r, 2147483648.0, 128.0, -2147483648.0, 2147483647.0) &
-                          static_cast<std::int32_t>(0xFFFFFF00u));
-      } else if constexpr (to == Kind::k16) {
-        Store<V, Dst>(out, FloatToInt<V, kDither>(x, r, 32768.0, 0.5, -32768.0, 32767.0));
-      } else {
-        Store<V, Dst>(out, FloatToInt<V, kDither>(x, r, 128.0, 0.5, -128.0, 127.0));
-      }
-    } else if constexpr (from == Kind::k8) {
-      if constexpr (to == Kind::k8) {
-        Store<V, Dst>(out, x);
-      } else {
-        const float scale = to == Kind::k16 ? 255.9921875f : 16777216.0f;
-        Store<V, Dst>(out, __builtin_convertvector(__builtin_convertvector(x, F32) * scale, I32));
-      }
-    } else if constexpr (from == Kind::k16 && to == Kind::k24) {
-      Store<V, Dst>(out, __builtin_convertvector(__builtin_convertvector(x, F32) * 65536.0f, I32));
-    } else if constexpr (from == Kind::k16) {  // to 8-bit
-      if constexpr (kDither)
-        Store<V, Dst>(out, ClampI<V>(x + (r >> 8), -32768, 32767) >> 8);
-      else
-        Store<V, Dst>(out, x >> 8);
-    } else if constexpr (to == Kind::k24) {
-      Store<V, Dst>(out, x);
-    } else if constexpr (to == Kind::k16) {
-      if constexpr (kDither)
-        Store<V, Dst>(out, ClampI<V>((x >> 8) + (r >> 8), -8388608, 8388607) >> 8);
-      else
-        Store<V, Dst>(out, x >> 16);
-    } else {  // 24-bit to 8-bit
-      if constexpr (kDither)
-        Store<V, Dst>(out, ClampI<V>((x >> 8) + r, -8388608, 8388607) >> 16);
-      else
-        Store<V, Dst>(out, x >> 24);
-    }
+  for (; i <= last; i += kStep) {
+    Block<V, Src, Dst, kDither>(s + static_cast<std::ptrdiff_t>(i) * Src::kBytes,
+                                d + static_cast<std::ptrdiff_t>(i) * Dst::kBytes, s0,
+                                std::make_integer_sequence<int, kGroups>());
   }
   if constexpr (kDither) *state = s0[0];
   return i;
@@ -302,6 +372,23 @@ template <class Src, class Dst, bool kDither>
 int RunBaseline(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) noexcept {
   return Body<4, Src, Dst, kDither>(s, d, n, state);
 }
+
+#if TARN_CONVERTER_X86
+// SSE4.1 brings the byte shuffle that 8-bit and packed 24-bit data need.
+template <class Src, class Dst, bool kDither>
+__attribute__((target("sse4.1"))) int RunSse41(const std::uint8_t* s, std::uint8_t* d, int n,
+                                               std::uint32_t* state) noexcept {
+  return Body<4, Src, Dst, kDither>(s, d, n, state);
+}
+
+bool CpuHasSse41() noexcept {
+  static const bool has = [] {
+    __builtin_cpu_init();
+    return __builtin_cpu_supports("sse4.1") != 0;
+  }();
+  return has;
+}
+#endif
 
 #if TARN_CONVERTER_AVX2
 template <class Src, class Dst, bool kDither>
@@ -331,7 +418,10 @@ const char* InstructionSet() noexcept {
   const int level = gLevel.load(std::memory_order_relaxed);
   if (level == static_cast<int>(KernelLevel::kScalar)) return "scalar";
 #if TARN_CONVERTER_AVX2
-  if (level == static_cast<int>(KernelLevel::kBest) && CpuHasAvx2()) return "avx2";
+  if (level >= static_cast<int>(KernelLevel::kBest) && CpuHasAvx2()) return "avx2";
+#endif
+#if TARN_CONVERTER_X86
+  if (level >= static_cast<int>(KernelLevel::kExtended) && CpuHasSse41()) return "sse4.1";
 #endif
 #if defined(__x86_64__)
   return "sse2";
@@ -347,8 +437,13 @@ Kernel Get() noexcept {
   const int level = gLevel.load(std::memory_order_relaxed);
   if (level == static_cast<int>(KernelLevel::kScalar)) return nullptr;
 #if TARN_CONVERTER_AVX2
-  if (level == static_cast<int>(KernelLevel::kBest) && CpuHasAvx2()) {
+  if (level >= static_cast<int>(KernelLevel::kBest) && CpuHasAvx2()) {
     return &RunAvx2<Src, Dst, kDither>;
+  }
+#endif
+#if TARN_CONVERTER_X86
+  if (level >= static_cast<int>(KernelLevel::kExtended) && CpuHasSse41()) {
+    return &RunSse41<Src, Dst, kDither>;
   }
 #endif
   return &RunBaseline<Src, Dst, kDither>;

@@ -7,9 +7,9 @@
 // in the same order as the scalar generator and leave `*ditherState` where
 // the scalar generator would be after the converted prefix.
 //
-// The kernel for a pair is chosen once per process from the processor's
-// features (AVX2 or the SSE2 baseline on x86-64, NEON on AArch64, plain
-// vector code elsewhere).
+// The kernel for a pair is chosen from the processor's features, detected
+// once per process: AVX2, SSE4.1 or the SSE2 baseline on x86-64 (AVX2 not on
+// Windows builds), NEON on AArch64, plain vector code elsewhere.
 #pragma once
 
 #include <cstdint>
@@ -20,10 +20,11 @@ using Kernel = int (*)(const std::uint8_t* source, std::uint8_t* destination, in
                        std::uint32_t* ditherState) noexcept;
 
 // Which kernels converters use: none (per-sample rules only), the
-// architecture's baseline vector code (SSE2, NEON, plain vector code), or the
-// best the processor supports (AVX2 where available). The default is kBest;
-// tests lower it to check every path. Takes effect for later Convert calls.
-enum class KernelLevel { kScalar = 0, kBaseline = 1, kBest = 2 };
+// architecture's baseline vector code (SSE2, NEON, plain vector code), the
+// middle tier (SSE4.1 where available, else the baseline), or the best the
+// processor supports (AVX2, else as kExtended). The default is kBest; tests
+// lower it to check every path. Takes effect for later Convert calls.
+enum class KernelLevel { kScalar = 0, kBaseline = 1, kExtended = 2, kBest = 3 };
 void SetKernelLevel(KernelLevel level) noexcept;
 
 // The kernel for a pair at the current level, or null for the per-sample
@@ -31,8 +32,8 @@ void SetKernelLevel(KernelLevel level) noexcept;
 template <class Src, class Dst, bool kDither>
 [[nodiscard]] Kernel Get() noexcept;
 
-// Name of the instruction set the current level runs with ("avx2", "sse2",
-// "neon", "generic", "scalar"); for benchmarks and diagnostics.
+// Name of the instruction set the current level runs with ("avx2", "sse4.1",
+// "sse2", "neon", "generic", "scalar"); for benchmarks and diagnostics.
 [[nodiscard]] const char* InstructionSet() noexcept;
 
 }  // namespace tarn::ConverterKernels

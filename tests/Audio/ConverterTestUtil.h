@@ -22,7 +22,7 @@ namespace convtest {
 using tarn::ConverterKernels::KernelLevel;
 
 inline const KernelLevel kLevels[] = {KernelLevel::kScalar, KernelLevel::kBaseline,
-                                      KernelLevel::kBest};
+                                      KernelLevel::kExtended, KernelLevel::kBest};
 
 inline const char* LevelName(KernelLevel level) {
   return level == KernelLevel::kScalar     ? "scalar"
