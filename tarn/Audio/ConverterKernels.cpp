@@ -432,6 +432,17 @@ const char* InstructionSet() noexcept {
 #endif
 }
 
+// The baseline kernel, or null where the per-sample path is faster: SSE2
+// has no byte shuffle, so on x86-64 only pairs of 4-byte formats use it.
+template <class Src, class Dst, bool kDither>
+Kernel Baseline() noexcept {
+  if constexpr (TARN_CONVERTER_X86 && (Src::kBytes != 4 || Dst::kBytes != 4)) {
+    return nullptr;
+  } else {
+    return &RunBaseline<Src, Dst, kDither>;
+  }
+}
+
 template <class Src, class Dst, bool kDither>
 Kernel Get() noexcept {
   const int level = gLevel.load(std::memory_order_relaxed);
@@ -446,7 +457,7 @@ Kernel Get() noexcept {
     return &RunSse41<Src, Dst, kDither>;
   }
 #endif
-  return &RunBaseline<Src, Dst, kDither>;
+  return Baseline<Src, Dst, kDither>();
 }
 
 #define TARN_INSTANTIATE_W(S, D) template Kernel Get<S, D, false>() noexcept;

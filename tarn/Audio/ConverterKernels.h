@@ -20,7 +20,8 @@ using Kernel = int (*)(const std::uint8_t* source, std::uint8_t* destination, in
                        std::uint32_t* ditherState) noexcept;
 
 // Which kernels converters use: none (per-sample rules only), the
-// architecture's baseline vector code (SSE2, NEON, plain vector code), the
+// architecture's baseline vector code (SSE2 for pairs of 4-byte formats,
+// NEON, plain vector code), the
 // middle tier (SSE4.1 where available, else the baseline), or the best the
 // processor supports (AVX2, else as kExtended). The default is kBest; tests
 // lower it to check every path. Takes effect for later Convert calls.
