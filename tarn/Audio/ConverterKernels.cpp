@@ -225,7 +225,9 @@ TARN_INLINE typename Lanes<V>::I32 ClampI(const typename Lanes<V>::I32& x, std::
   return Select(y > Splat<I32>(hi), Splat<I32>(hi), y);
 }
 
-// trunc(clamp(g * scale + (g < 0 ? -half : half), lo, hi)) on half a group.
+// trunc(clamp(g * scale + (g < 0 ? -half : half), lo, hi)) on half a group,
+// in double precision as the dithered float rules need: f + d * 2^-31 is not
+// exact in single precision.
 template <int V>
 TARN_INLINE typename Lanes<V>::I32h RoundClipHalf(const typename Lanes<V>::F64h& g, double scale,
                                                   double half, double lo, double hi) {
@@ -236,21 +238,65 @@ TARN_INLINE typename Lanes<V>::I32h RoundClipHalf(const typename Lanes<V>::F64h&
   return __builtin_convertvector(v, typename Lanes<V>::I32h);
 }
 
-template <int V, bool kDither>
-TARN_INLINE typename Lanes<V>::I32 FloatToInt(const typename Lanes<V>::F32& f,
-                                              const typename Lanes<V>::I32& d, double scale,
-                                              double half, double lo, double hi) {
+template <int V>
+TARN_INLINE typename Lanes<V>::I32 FloatToIntDithered(const typename Lanes<V>::F32& f,
+                                                      const typename Lanes<V>::I32& d, double scale,
+                                                      double half, double lo, double hi) {
   using L = Lanes<V>;
   const typename L::F32 g = Select(f == f, f, Splat<typename L::F32>(0.0f));  // NaN as 0.0
   typename L::F64h glo = __builtin_convertvector(LowHalf<V>(g), typename L::F64h);
   typename L::F64h ghi = __builtin_convertvector(HighHalf<V>(g), typename L::F64h);
-  if constexpr (kDither) {
-    const typename L::F32 df = __builtin_convertvector(d, typename L::F32);  // |d| < 2^17: exact
-    glo += __builtin_convertvector(LowHalf<V>(df), typename L::F64h) * kFloatDitherScale;
-    ghi += __builtin_convertvector(HighHalf<V>(df), typename L::F64h) * kFloatDitherScale;
-  }
+  const typename L::F32 df = __builtin_convertvector(d, typename L::F32);  // |d| < 2^17: exact
+  glo += __builtin_convertvector(LowHalf<V>(df), typename L::F64h) * kFloatDitherScale;
+  ghi += __builtin_convertvector(HighHalf<V>(df), typename L::F64h) * kFloatDitherScale;
   return Join<V>(RoundClipHalf<V>(glo, scale, half, lo, hi),
                  RoundClipHalf<V>(ghi, scale, half, lo, hi));
+}
+
+// The undithered float rules in single precision. x = f * scale is exact
+// (a power of two), so the double-precision rule reduces to exact float and
+// integer steps:
+// - 8/16-bit: trunc(x +- 0.5) clipped is x rounded half away from zero,
+//   then saturated. With x first limited to +-2 * scale (which cannot change
+//   a saturated result), t = trunc(x) is exact, x - t is the exact fraction,
+//   and a fraction of at least one half moves t one step away from zero.
+// - 24-bit: for x in the 32-bit range trunc(x +- 128) = trunc(x) +- 128 (the
+//   sign taken from f < 0, so -0.0 adds +128). Every x at or above 2^31 - 256
+//   ends as 0x7FFFFF00 and every x at or below -2^31 + 128 as 0x80000000, so
+//   limiting x to those bounds keeps the integer sum in range.
+// NaN lanes are replaced by 0.0 first, as in the per-sample rules.
+template <int V>
+TARN_INLINE typename Lanes<V>::F32 ScaledNoNaN(const typename Lanes<V>::F32& f, float scale,
+                                               float lo, float hi) {
+  using F32 = typename Lanes<V>::F32;
+  F32 x = Select(f == f, f, Splat<F32>(0.0f)) * scale;
+  x = Select(x < Splat<F32>(lo), Splat<F32>(lo), x);
+  return Select(x > Splat<F32>(hi), Splat<F32>(hi), x);
+}
+
+template <int V>
+TARN_INLINE typename Lanes<V>::I32 FloatToIntRounded(const typename Lanes<V>::F32& f, float scale,
+                                                     std::int32_t lo, std::int32_t hi) {
+  using L = Lanes<V>;
+  using F32 = typename L::F32;
+  using I32 = typename L::I32;
+  const F32 x = ScaledNoNaN<V>(f, scale, -2 * scale, 2 * scale);
+  const I32 t = __builtin_convertvector(x, I32);
+  const F32 r = x - __builtin_convertvector(t, F32);
+  const I32 rounded = t - (I32)(r >= Splat<F32>(0.5f)) + (I32)(r <= Splat<F32>(-0.5f));
+  return ClampI<V>(rounded, lo, hi);
+}
+
+template <int V>
+TARN_INLINE typename Lanes<V>::I32 FloatToX32(const typename Lanes<V>::F32& f) {
+  using L = Lanes<V>;
+  using F32 = typename L::F32;
+  using I32 = typename L::I32;
+  const F32 x = ScaledNoNaN<V>(f, 2147483648.0f, -2147483520.0f, 2147483392.0f);
+  const I32 negative = (I32)(x < Splat<F32>(0.0f));
+  const I32 t =
+      __builtin_convertvector(x, I32) + Select(negative, Splat<I32>(-128), Splat<I32>(128));
+  return t & static_cast<std::int32_t>(0xFFFFFF00u);
 }
 
 // Generator jump: j steps map state s to a * s + c.
@@ -295,13 +341,16 @@ TARN_INLINE void Group(const std::uint8_t* s, std::uint8_t* d, const typename La
     Store<V, Dst>(out, y);
   } else if constexpr (from == Kind::kFloat) {
     if constexpr (to == Kind::k24) {
-      Store<V, Dst>(out,
-                    FloatToInt<V, false>(x, r, 2147483648.0, 128.0, -2147483648.0, 2147483647.0) &
-                        static_cast<std::int32_t>(0xFFFFFF00u));
+      Store<V, Dst>(out, FloatToX32<V>(x));
+    } else if constexpr (!kDither) {
+      if constexpr (to == Kind::k16)
+        Store<V, Dst>(out, FloatToIntRounded<V>(x, 32768.0f, -32768, 32767));
+      else
+        Store<V, Dst>(out, FloatToIntRounded<V>(x, 128.0f, -128, 127));
     } else if constexpr (to == Kind::k16) {
-      Store<V, Dst>(out, FloatToInt<V, kDither>(x, r, 32768.0, 0.5, -32768.0, 32767.0));
+      Store<V, Dst>(out, FloatToIntDithered<V>(x, r, 32768.0, 0.5, -32768.0, 32767.0));
     } else {
-      Store<V, Dst>(out, FloatToInt<V, kDither>(x, r, 128.0, 0.5, -128.0, 127.0));
+      Store<V, Dst>(out, FloatToIntDithered<V>(x, r, 128.0, 0.5, -128.0, 127.0));
     }
   } else if constexpr (from == Kind::k8) {
     if constexpr (to == Kind::k8) {
