@@ -80,10 +80,20 @@ TARN_INLINE T Splat(S s) {
   return v + s;
 }
 
-// Lane-wise mask ? a : b, the mask being the result of a vector comparison.
+// Lane-wise mask ? a : b, the mask being the result of a vector comparison;
+// compilers turn the common forms into min, max and blend instructions.
 template <class T, class M>
 TARN_INLINE T Select(const M& mask, const T& a, const T& b) {
-  return (T)(((M)a & mask) | ((M)b & ~mask));
+  return mask ? a : b;
+}
+
+template <class T>
+TARN_INLINE T Max(const T& a, const T& b) {
+  return a < b ? b : a;
+}
+template <class T>
+TARN_INLINE T Min(const T& a, const T& b) {
+  return b < a ? b : a;
 }
 
 // Byte shuffles: byte i of the result (N bytes) takes byte Map::At(i) of
@@ -221,8 +231,7 @@ template <int V>
 TARN_INLINE typename Lanes<V>::I32 ClampI(const typename Lanes<V>::I32& x, std::int32_t lo,
                                           std::int32_t hi) {
   using I32 = typename Lanes<V>::I32;
-  const I32 y = Select(x < Splat<I32>(lo), Splat<I32>(lo), x);
-  return Select(y > Splat<I32>(hi), Splat<I32>(hi), y);
+  return Min(Max(x, Splat<I32>(lo)), Splat<I32>(hi));
 }
 
 // trunc(clamp(g * scale + (g < 0 ? -half : half), lo, hi)) on half a group,
@@ -257,9 +266,10 @@ TARN_INLINE typename Lanes<V>::I32 FloatToIntDithered(const typename Lanes<V>::F
 // (a power of two), so the double-precision rule reduces to exact float and
 // integer steps:
 // - 8/16-bit: trunc(x +- 0.5) clipped is x rounded half away from zero,
-//   then saturated. With x first limited to +-2 * scale (which cannot change
-//   a saturated result), t = trunc(x) is exact, x - t is the exact fraction,
-//   and a fraction of at least one half moves t one step away from zero.
+//   then saturated, which equals x first limited to the integer bounds and
+//   then rounded. For every float of magnitude up to 32768, rounding half
+//   away from zero equals trunc(x + copysign(0.49999997f, x)) with the sum
+//   rounded to float (checked over all such floats), so no double is needed.
 // - 24-bit: for x in the 32-bit range trunc(x +- 128) = trunc(x) +- 128 (the
 //   sign taken from f < 0, so -0.0 adds +128). Every x at or above 2^31 - 256
 //   ends as 0x7FFFFF00 and every x at or below -2^31 + 128 as 0x80000000, so
@@ -269,22 +279,19 @@ template <int V>
 TARN_INLINE typename Lanes<V>::F32 ScaledNoNaN(const typename Lanes<V>::F32& f, float scale,
                                                float lo, float hi) {
   using F32 = typename Lanes<V>::F32;
-  F32 x = Select(f == f, f, Splat<F32>(0.0f)) * scale;
-  x = Select(x < Splat<F32>(lo), Splat<F32>(lo), x);
-  return Select(x > Splat<F32>(hi), Splat<F32>(hi), x);
+  const F32 x = Select(f == f, f, Splat<F32>(0.0f)) * scale;
+  return Min(Max(x, Splat<F32>(lo)), Splat<F32>(hi));
 }
 
 template <int V>
-TARN_INLINE typename Lanes<V>::I32 FloatToIntRounded(const typename Lanes<V>::F32& f, float scale,
-                                                     std::int32_t lo, std::int32_t hi) {
+TARN_INLINE typename Lanes<V>::I32 FloatToIntRounded(const typename Lanes<V>::F32& f, float scale) {
   using L = Lanes<V>;
   using F32 = typename L::F32;
   using I32 = typename L::I32;
-  const F32 x = ScaledNoNaN<V>(f, scale, -2 * scale, 2 * scale);
-  const I32 t = __builtin_convertvector(x, I32);
-  const F32 r = x - __builtin_convertvector(t, F32);
-  const I32 rounded = t - (I32)(r >= Splat<F32>(0.5f)) + (I32)(r <= Splat<F32>(-0.5f));
-  return ClampI<V>(rounded, lo, hi);
+  const F32 x = ScaledNoNaN<V>(f, scale, -scale, scale - 1.0f);
+  const I32 sign = (I32)x & static_cast<std::int32_t>(0x80000000u);
+  const F32 half = (F32)((I32)Splat<F32>(0.49999997f) | sign);
+  return __builtin_convertvector(x + half, I32);
 }
 
 template <int V>
@@ -344,9 +351,9 @@ TARN_INLINE void Group(const std::uint8_t* s, std::uint8_t* d, const typename La
       Store<V, Dst>(out, FloatToX32<V>(x));
     } else if constexpr (!kDither) {
       if constexpr (to == Kind::k16)
-        Store<V, Dst>(out, FloatToIntRounded<V>(x, 32768.0f, -32768, 32767));
+        Store<V, Dst>(out, FloatToIntRounded<V>(x, 32768.0f));
       else
-        Store<V, Dst>(out, FloatToIntRounded<V>(x, 128.0f, -128, 127));
+        Store<V, Dst>(out, FloatToIntRounded<V>(x, 128.0f));
     } else if constexpr (to == Kind::k16) {
       Store<V, Dst>(out, FloatToIntDithered<V>(x, r, 32768.0, 0.5, -32768.0, 32767.0));
     } else {
