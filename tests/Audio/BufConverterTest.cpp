@@ -316,3 +316,19 @@ TEST(BufConverterClone, ContinuesTheDitherSequence) {
 }
 
 }  // namespace
+
+namespace {
+
+// Names the kernels this machine runs, so test logs show which vector path
+// the comparisons above covered at the best level.
+TEST(ConverterKernels, InstructionSetPerLevel) {
+  LevelRestorer restore;
+  for (KernelLevel level : kLevels) {
+    tarn::ConverterKernels::SetKernelLevel(level);
+    const std::string name = tarn::ConverterKernels::InstructionSet();
+    std::printf("[ kernels  ] %s: %s\n", LevelName(level), name.c_str());
+    EXPECT_EQ(level == KernelLevel::kScalar, name == "scalar");
+  }
+}
+
+}  // namespace

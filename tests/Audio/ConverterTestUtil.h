@@ -25,9 +25,16 @@ inline const KernelLevel kLevels[] = {KernelLevel::kScalar, KernelLevel::kBaseli
                                       KernelLevel::kExtended, KernelLevel::kBest};
 
 inline const char* LevelName(KernelLevel level) {
-  return level == KernelLevel::kScalar     ? "scalar"
-         : level == KernelLevel::kBaseline ? "baseline"
-                                           : "best";
+  switch (level) {
+    case KernelLevel::kScalar:
+      return "scalar";
+    case KernelLevel::kBaseline:
+      return "baseline";
+    case KernelLevel::kExtended:
+      return "extended";
+    default:
+      return "best";
+  }
 }
 
 // Puts the kernels back to their default when a test leaves.
