@@ -12,6 +12,7 @@
 //   value the scalar generator would draw for sample k of that group.
 #include "tarn/Audio/ConverterKernels.h"
 
+#include <algorithm>
 #include <atomic>
 #include <cstring>
 #include <utility>
@@ -57,6 +58,7 @@ struct Lanes<4> {
   typedef std::uint8_t B __attribute__((vector_size(16)));
   typedef std::uint8_t B1 __attribute__((vector_size(4)));
   typedef std::uint8_t B2 __attribute__((vector_size(8)));
+  typedef std::int16_t I16w __attribute__((vector_size(16)));
 };
 
 template <>
@@ -70,6 +72,7 @@ struct Lanes<8> {
   typedef std::uint8_t B __attribute__((vector_size(32)));
   typedef std::uint8_t B1 __attribute__((vector_size(8)));
   typedef std::uint8_t B2 __attribute__((vector_size(16)));
+  typedef std::int16_t I16w __attribute__((vector_size(32)));
 };
 
 #define TARN_INLINE [[gnu::always_inline]] inline
@@ -319,9 +322,15 @@ constexpr Jump JumpOf(int steps) {
   return j;
 }
 
-// Converts group kG of a block: V samples.
+// Groups of V samples that one 4V-byte vector of a format holds.
+template <class Buf>
+inline constexpr int kPerVector = Buf::kBytes == 1   ? 4
+                                  : Buf::kBytes == 2 ? 2
+                                                     : 1;
+
+// Converts group kG of a block (V samples) and returns the destination lanes.
 template <int V, class Src, class Dst, bool kDither, int kG>
-TARN_INLINE void Group(const std::uint8_t* s, std::uint8_t* d, const typename Lanes<V>::B& raw,
+TARN_INLINE auto Group(const std::uint8_t* s, const typename Lanes<V>::B* raw,
                        typename Lanes<V>::U32& s0) {
   using L = Lanes<V>;
   using I32 = typename L::I32;
@@ -329,8 +338,8 @@ TARN_INLINE void Group(const std::uint8_t* s, std::uint8_t* d, const typename La
   using F32 = typename L::F32;
   constexpr Kind from = Src::kKind, to = Dst::kKind;
   constexpr Jump kOne = JumpOf(1), kGroup = JumpOf(2 * V);
-  const auto x = Load<V, Src, kG>(s + kG * V * Src::kBytes, raw);
-  std::uint8_t* out = d + kG * V * Dst::kBytes;
+  constexpr int kPer = kPerVector<Src>;
+  const auto x = Load<V, Src, kG % kPer>(s + kG * V * Src::kBytes, raw[kG / kPer]);
   I32 r = {};
   if constexpr (kDither) {
     const U32 s1 = s0 * kOne.a + kOne.c;
@@ -345,63 +354,86 @@ TARN_INLINE void Group(const std::uint8_t* s, std::uint8_t* d, const typename La
       y *= 1.0f / 32768.0f;
     else
       y *= 1.0f / 2147483648.0f;
-    Store<V, Dst>(out, y);
+    return y;
   } else if constexpr (from == Kind::kFloat) {
     if constexpr (to == Kind::k24) {
-      Store<V, Dst>(out, FloatToX32<V>(x));
+      return FloatToX32<V>(x);
     } else if constexpr (!kDither) {
       if constexpr (to == Kind::k16)
-        Store<V, Dst>(out, FloatToIntRounded<V>(x, 32768.0f));
+        return FloatToIntRounded<V>(x, 32768.0f);
       else
-        Store<V, Dst>(out, FloatToIntRounded<V>(x, 128.0f));
+        return FloatToIntRounded<V>(x, 128.0f);
     } else if constexpr (to == Kind::k16) {
-      Store<V, Dst>(out, FloatToIntDithered<V>(x, r, 32768.0, 0.5, -32768.0, 32767.0));
+      return FloatToIntDithered<V>(x, r, 32768.0, 0.5, -32768.0, 32767.0);
     } else {
-      Store<V, Dst>(out, FloatToIntDithered<V>(x, r, 128.0, 0.5, -128.0, 127.0));
+      return FloatToIntDithered<V>(x, r, 128.0, 0.5, -128.0, 127.0);
     }
   } else if constexpr (from == Kind::k8) {
     if constexpr (to == Kind::k8) {
-      Store<V, Dst>(out, x);
+      return x;
     } else {
       const float scale = to == Kind::k16 ? 255.9921875f : 16777216.0f;
-      Store<V, Dst>(out, __builtin_convertvector(__builtin_convertvector(x, F32) * scale, I32));
+      return __builtin_convertvector(__builtin_convertvector(x, F32) * scale, I32);
     }
   } else if constexpr (from == Kind::k16 && to == Kind::k24) {
-    Store<V, Dst>(out, __builtin_convertvector(__builtin_convertvector(x, F32) * 65536.0f, I32));
+    return __builtin_convertvector(__builtin_convertvector(x, F32) * 65536.0f, I32);
   } else if constexpr (from == Kind::k16) {  // to 8-bit
     if constexpr (kDither)
-      Store<V, Dst>(out, ClampI<V>(x + (r >> 8), -32768, 32767) >> 8);
+      return ClampI<V>(x + (r >> 8), -32768, 32767) >> 8;
     else
-      Store<V, Dst>(out, x >> 8);
+      return x >> 8;
   } else if constexpr (to == Kind::k24) {
-    Store<V, Dst>(out, x);
+    return x;
   } else if constexpr (to == Kind::k16) {
     if constexpr (kDither)
-      Store<V, Dst>(out, ClampI<V>((x >> 8) + (r >> 8), -8388608, 8388607) >> 8);
+      return ClampI<V>((x >> 8) + (r >> 8), -8388608, 8388607) >> 8;
     else
-      Store<V, Dst>(out, x >> 16);
+      return x >> 16;
   } else {  // 24-bit to 8-bit
     if constexpr (kDither)
-      Store<V, Dst>(out, ClampI<V>((x >> 8) + r, -8388608, 8388607) >> 16);
+      return ClampI<V>((x >> 8) + r, -8388608, 8388607) >> 16;
     else
-      Store<V, Dst>(out, x >> 24);
+      return x >> 24;
   }
 }
 
+template <class T, std::size_t... Is>
+TARN_INLINE auto Concat(const T& a, const T& b, std::index_sequence<Is...>) {
+  return __builtin_shufflevector(a, b, static_cast<int>(Is)...);
+}
+template <class T>
+TARN_INLINE auto Concat(const T& a, const T& b) {
+  return Concat(a, b, std::make_index_sequence<2 * sizeof(T) / sizeof(a[0])>());
+}
+
+// A block of kGroups groups. Two groups for a 16-bit destination are
+// narrowed together and stored at once (one pack instead of two shuffles);
+// otherwise each group is stored by itself.
 template <int V, class Src, class Dst, bool kDither, int... kGs>
 TARN_INLINE void Block(const std::uint8_t* s, std::uint8_t* d, typename Lanes<V>::U32& s0,
                        std::integer_sequence<int, kGs...>) {
-  typename Lanes<V>::B raw = {};
-  if constexpr (Src::kBytes <= 2) std::memcpy(&raw, s, sizeof raw);
-  (Group<V, Src, Dst, kDither, kGs>(s, d, raw, s0), ...);
+  using L = Lanes<V>;
+  constexpr int kGroups = sizeof...(kGs);
+  typename L::B raw[kGroups] = {};
+  if constexpr (Src::kBytes <= 2) {
+    for (int k = 0; k < kGroups / kPerVector<Src>; ++k)
+      std::memcpy(&raw[k], s + k * sizeof raw[0], sizeof raw[0]);
+  }
+  if constexpr (Dst::kBytes == 2 && kGroups == 2) {
+    const typename L::I32 r[kGroups] = {Group<V, Src, Dst, kDither, kGs>(s, raw, s0)...};
+    const auto b = __builtin_convertvector(Concat(r[0], r[1]), typename L::I16w);
+    std::memcpy(d, &b, sizeof b);
+  } else {
+    (Store<V, Dst>(d + kGs * V * Dst::kBytes, Group<V, Src, Dst, kDither, kGs>(s, raw, s0)), ...);
+  }
 }
 
 // Converts whole blocks: four groups for 8-bit sources and two for 16-bit
-// ones (one 4V-byte load each), one group otherwise.
+// sources or destinations (one 4V-byte load or store each), one otherwise.
 template <int V, class Src, class Dst, bool kDither>
 TARN_INLINE int Body(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) {
   using U32 = typename Lanes<V>::U32;
-  constexpr int kGroups = Src::kBytes == 1 ? 4 : Src::kBytes == 2 ? 2 : 1;
+  constexpr int kGroups = std::max(kPerVector<Src>, Dst::kBytes == 2 ? 2 : 1);
   constexpr bool kPacked = Src::kBytes == 3 || Dst::kBytes == 3;
   constexpr int kStep = kGroups * V;
   // Packed loads and stores touch V bytes past the block.
