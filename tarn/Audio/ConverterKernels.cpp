@@ -14,6 +14,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <bit>
 #include <cstring>
 #include <utility>
 
@@ -269,32 +270,41 @@ TARN_INLINE typename Lanes<V>::I32 FloatToIntDithered(const typename Lanes<V>::F
 // (a power of two), so the double-precision rule reduces to exact float and
 // integer steps:
 // - 8/16-bit: trunc(x +- 0.5) clipped is x rounded half away from zero,
-//   then saturated, which equals x first limited to the integer bounds and
-//   then rounded. For every float of magnitude up to 32768, rounding half
+//   then saturated, which equals x first limited to magnitude `scale`, then
+//   rounded, then limited to scale - 1. For every float of magnitude up to 32768, rounding half
 //   away from zero equals trunc(x + copysign(0.49999997f, x)) with the sum
 //   rounded to float (checked over all such floats), so no double is needed.
 // - 24-bit: for x in the 32-bit range trunc(x +- 128) = trunc(x) +- 128 (the
 //   sign taken from f < 0, so -0.0 adds +128). Every x at or above 2^31 - 256
-//   ends as 0x7FFFFF00 and every x at or below -2^31 + 128 as 0x80000000, so
-//   limiting x to those bounds keeps the integer sum in range.
+//   ends as 0x7FFFFF00 and every x at or below -2^31 + 256 as 0x80000000, so
+//   limiting |x| to 2^31 - 256 keeps the integer sum in range.
 // NaN lanes are replaced by 0.0 first, as in the per-sample rules.
-template <int V>
-TARN_INLINE typename Lanes<V>::F32 ScaledNoNaN(const typename Lanes<V>::F32& f, float scale,
-                                               float lo, float hi) {
-  using F32 = typename Lanes<V>::F32;
-  const F32 x = Select(f == f, f, Splat<F32>(0.0f)) * scale;
-  return Min(Max(x, Splat<F32>(lo)), Splat<F32>(hi));
-}
-
-template <int V>
-TARN_INLINE typename Lanes<V>::I32 FloatToIntRounded(const typename Lanes<V>::F32& f, float scale) {
+// x = f * scale with NaN lanes replaced by 0.0 and magnitudes limited to
+// `limit`. The limit is applied to the bit pattern: for non-negative floats
+// (infinity included) the unsigned order of the bits is the numeric order,
+// and an unsigned minimum is cheaper than a float blend.
+template <int V, std::uint32_t kLimitBits>
+TARN_INLINE typename Lanes<V>::F32 ScaledLimited(const typename Lanes<V>::F32& f, float scale,
+                                                 typename Lanes<V>::U32& sign) {
   using L = Lanes<V>;
   using F32 = typename L::F32;
+  using U32 = typename L::U32;
+  const U32 bits = (U32)(Select(f == f, f, Splat<F32>(0.0f)) * scale);
+  sign = bits & 0x80000000u;
+  return (F32)(Min(bits ^ sign, Splat<U32>(kLimitBits)) | sign);
+}
+
+template <int V, int kScale>
+TARN_INLINE typename Lanes<V>::I32 FloatToIntRounded(const typename Lanes<V>::F32& f) {
+  using L = Lanes<V>;
   using I32 = typename L::I32;
-  const F32 x = ScaledNoNaN<V>(f, scale, -scale, scale - 1.0f);
-  const I32 sign = (I32)x & static_cast<std::int32_t>(0x80000000u);
-  const F32 half = (F32)((I32)Splat<F32>(0.49999997f) | sign);
-  return __builtin_convertvector(x + half, I32);
+  constexpr float kScaleF = static_cast<float>(kScale);
+  constexpr std::uint32_t kHalfBits = std::bit_cast<std::uint32_t>(0.49999997f);
+  typename L::U32 sign;
+  const typename L::F32 x =
+      ScaledLimited<V, std::bit_cast<std::uint32_t>(kScaleF)>(f, kScaleF, sign);
+  const I32 t = __builtin_convertvector(x + (typename L::F32)(sign | kHalfBits), I32);
+  return Min(t, Splat<I32>(kScale - 1));
 }
 
 template <int V>
@@ -302,7 +312,9 @@ TARN_INLINE typename Lanes<V>::I32 FloatToX32(const typename Lanes<V>::F32& f) {
   using L = Lanes<V>;
   using F32 = typename L::F32;
   using I32 = typename L::I32;
-  const F32 x = ScaledNoNaN<V>(f, 2147483648.0f, -2147483520.0f, 2147483392.0f);
+  typename L::U32 sign;
+  const F32 x =
+      ScaledLimited<V, std::bit_cast<std::uint32_t>(2147483392.0f)>(f, 2147483648.0f, sign);
   const I32 negative = (I32)(x < Splat<F32>(0.0f));
   const I32 t =
       __builtin_convertvector(x, I32) + Select(negative, Splat<I32>(-128), Splat<I32>(128));
@@ -360,9 +372,9 @@ TARN_INLINE auto Group(const std::uint8_t* s, const typename Lanes<V>::B* raw,
       return FloatToX32<V>(x);
     } else if constexpr (!kDither) {
       if constexpr (to == Kind::k16)
-        return FloatToIntRounded<V>(x, 32768.0f);
+        return FloatToIntRounded<V, 32768>(x);
       else
-        return FloatToIntRounded<V>(x, 128.0f);
+        return FloatToIntRounded<V, 128>(x);
     } else if constexpr (to == Kind::k16) {
       return FloatToIntDithered<V>(x, r, 32768.0, 0.5, -32768.0, 32767.0);
     } else {
