@@ -121,6 +121,28 @@ TEST(BufConverterRandom, FloatAnd24BitSources) {
   }
 }
 
+// Float bit patterns across the whole 32-bit space at a prime stride: every
+// exponent, both signs, NaN payloads and denormals, each through every kernel
+// level to every integer destination.
+TEST(BufConverterRandom, FloatBitPatternsAcrossTheWholeSpace) {
+  LevelRestorer restore;
+  std::vector<std::uint8_t> src;
+  for (std::uint64_t bits = 0; bits < (std::uint64_t{1} << 32); bits += 1021) {
+    for (int k = 0; k < 4; ++k) src.push_back(static_cast<std::uint8_t>(bits >> (8 * k)));
+  }
+  const int count = static_cast<int>(src.size() / 4);
+  for (int to = 0; to <= 4; ++to) {
+    const std::vector<std::uint8_t> want = convref::ConvertRun(5, to, nullptr, src, count);
+    auto conv = BufConverter::Create(Fmt(5), Fmt(to), tarn::kNoDither);
+    for (KernelLevel level : kLevels) {
+      SetKernelLevel(level);
+      std::vector<std::uint8_t> got(want.size());
+      conv->Convert(src.data(), got.data(), count);
+      EXPECT_TRUE(got == want) << "to " << to << " at " << LevelName(level);
+    }
+  }
+}
+
 // Runs of 0 to 40 samples at every byte alignment of source and destination,
 // with guard bytes around the destination; a dithered converter keeps its
 // sequence across the calls.
