@@ -5,8 +5,11 @@
 // - integer to float: the integer converts exactly (16-bit) or with one
 //   round-to-nearest (24-bit words), and the scale is a power of two, so the
 //   product equals the exact quotient rounded once, as the rules require;
-// - float to integer: the rule's double-precision arithmetic, lane by lane,
-//   with the clamp done before the truncating conversion;
+// - float to integer without dither: exact single-precision steps that
+//   provably give the double-precision rule's result (see FloatToIntRounded
+//   and FloatToX32; also checked against the rules over all 2^32 floats);
+// - float to integer with dither: the rule's double-precision arithmetic,
+//   lane by lane, with the clamp done before the truncating conversion;
 // - dither: each lane runs the generator from its own starting point, found
 //   by jumping the linear congruence ahead, so lane k of a group draws the
 //   value the scalar generator would draw for sample k of that group.
@@ -271,14 +274,16 @@ TARN_INLINE typename Lanes<V>::I32 FloatToIntDithered(const typename Lanes<V>::F
 // integer steps:
 // - 8/16-bit: trunc(x +- 0.5) clipped is x rounded half away from zero,
 //   then saturated, which equals x first limited to magnitude `scale`, then
-//   rounded, then limited to scale - 1. For every float of magnitude up to 32768, rounding half
-//   away from zero equals trunc(x + copysign(0.49999997f, x)) with the sum
-//   rounded to float (checked over all such floats), so no double is needed.
+//   rounded, then limited to scale - 1. For every float of magnitude up to
+//   32768, rounding half away from zero equals
+//   trunc(x + copysign(0.49999997f, x)) with the sum rounded to float
+//   (checked over all such floats), so no double is needed.
 // - 24-bit: for x in the 32-bit range trunc(x +- 128) = trunc(x) +- 128 (the
 //   sign taken from f < 0, so -0.0 adds +128). Every x at or above 2^31 - 256
 //   ends as 0x7FFFFF00 and every x at or below -2^31 + 256 as 0x80000000, so
 //   limiting |x| to 2^31 - 256 keeps the integer sum in range.
 // NaN lanes are replaced by 0.0 first, as in the per-sample rules.
+//
 // x = f * scale with NaN lanes replaced by 0.0 and magnitudes limited to
 // `limit`. The limit is applied to the bit pattern: for non-negative floats
 // (infinity included) the unsigned order of the bits is the numeric order,
