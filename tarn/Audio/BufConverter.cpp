@@ -37,7 +37,7 @@ inline void ConvertRun(State& state, const void* source, void* destination, int 
       ConvertOne<SrcBuf, DstBuf>(state, s + k * kIn, d + k * kOut);
     }
   };
-  for (; i + 4 <= count; i += 4) {
+  for (; count - i >= 4; i += 4) {
     one(i);
     one(i + 1);
     one(i + 2);
