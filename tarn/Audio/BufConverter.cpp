@@ -1,5 +1,6 @@
 #include "tarn/Audio/BufConverter.h"
 
+#include <cstdint>
 #include <type_traits>
 
 #include "tarn/Audio/ConverterKernels.h"
@@ -22,13 +23,6 @@ inline void ConvertRun(State& state, const void* source, void* destination, int 
   if (count <= 0) return;
   const auto* s = static_cast<const std::uint8_t*>(source);
   auto* d = static_cast<std::uint8_t*>(destination);
-  int i = 0;
-  if (const ConverterKernels::Kernel kernel = ConverterKernels::Get<SrcBuf, DstBuf, kDither>()) {
-    std::uint32_t ditherState = 0;
-    if constexpr (kDither) ditherState = state.GetState();
-    i = kernel(s, d, count, &ditherState);
-    if constexpr (kDither) state = TriangularPDFDither16(ditherState);
-  }
   constexpr std::ptrdiff_t kIn = SrcBuf::kBytes, kOut = DstBuf::kBytes;
   auto one = [&](std::ptrdiff_t k) {
     if constexpr (std::is_same_v<State, NoDitherState>) {
@@ -37,6 +31,21 @@ inline void ConvertRun(State& state, const void* source, void* destination, int 
       ConvertOne<SrcBuf, DstBuf>(state, s + k * kIn, d + k * kOut);
     }
   };
+  int i = 0;
+  if (const ConverterKernels::Kernel kernel = ConverterKernels::Get<SrcBuf, DstBuf, kDither>()) {
+    // Long runs stream their stores; a few samples converted singly first
+    // bring the destination to a 64-byte boundary when its stride allows.
+    const bool stream = static_cast<long long>(count) * kOut >= ConverterKernels::kStreamingBytes;
+    if (stream) {
+      while (i < 64 && reinterpret_cast<std::uintptr_t>(d + i * kOut) % 64 != 0) ++i;
+      if (i == 64) i = 0;
+      for (int k = 0; k < i; ++k) one(k);
+    }
+    std::uint32_t ditherState = 0;
+    if constexpr (kDither) ditherState = state.GetState();
+    i += kernel(s + i * kIn, d + i * kOut, count - i, &ditherState, stream);
+    if constexpr (kDither) state = TriangularPDFDither16(ditherState);
+  }
   for (; count - i >= 4; i += 4) {
     one(i);
     one(i + 1);

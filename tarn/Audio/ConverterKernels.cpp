@@ -23,6 +23,10 @@
 
 #include "tarn/Audio/ConverterRules.h"
 
+#if defined(__x86_64__)
+#include <immintrin.h>  // declares the streaming-store builtins for GCC
+#endif
+
 #if defined(__GNUC__)
 // The 32-byte vector types below never cross a function boundary outside the
 // always-inlined kernel bodies, so the ABI note does not apply.
@@ -211,9 +215,27 @@ TARN_INLINE auto Load(const std::uint8_t* p, const typename Lanes<V>::B& raw) {
   }
 }
 
+// Stores one full vector to a destination aligned to its size, bypassing
+// the caches (for long runs that would only evict the caller's data).
+template <class T>
+TARN_INLINE void StreamStore(std::uint8_t* p, const T& v) {
+#if defined(__clang__)
+  __builtin_nontemporal_store(v, reinterpret_cast<T*>(p));
+#elif TARN_CONVERTER_X86
+  typedef long long Q2 __attribute__((vector_size(16)));
+  typedef long long Q4 __attribute__((vector_size(32)));
+  if constexpr (sizeof(T) == 16)
+    __builtin_ia32_movntdq(reinterpret_cast<Q2*>(p), (Q2)v);
+  else
+    __builtin_ia32_movntdq256(reinterpret_cast<Q4*>(p), (Q4)v);
+#else
+  std::memcpy(p, &v, sizeof v);
+#endif
+}
+
 // Writes V canonical lanes; integer lanes are already in the destination's
 // range.
-template <int V, class Dst, class T>
+template <int V, class Dst, bool kStream = false, class T>
 TARN_INLINE void Store(std::uint8_t* p, const T& v) {
   using L = Lanes<V>;
   using M = ByteMaps<V>;
@@ -229,6 +251,8 @@ TARN_INLINE void Store(std::uint8_t* p, const T& v) {
     // caller's per-sample tail overwrite; the caller leaves room.
     const typename L::B b = ShuffleBytes<4 * V, typename M::WordsToPacked>((typename L::B)v);
     std::memcpy(p, &b, sizeof b);
+  } else if constexpr (kStream) {
+    StreamStore(p, v);
   } else {
     std::memcpy(p, &v, sizeof v);
   }
@@ -426,7 +450,7 @@ TARN_INLINE auto Concat(const T& a, const T& b) {
 // A block of kGroups groups. Two groups for a 16-bit destination are
 // narrowed together and stored at once (one pack instead of two shuffles);
 // otherwise each group is stored by itself.
-template <int V, class Src, class Dst, bool kDither, int... kGs>
+template <int V, class Src, class Dst, bool kDither, bool kStream, int... kGs>
 TARN_INLINE void Block(const std::uint8_t* s, std::uint8_t* d, typename Lanes<V>::U32& s0,
                        std::integer_sequence<int, kGs...>) {
   using L = Lanes<V>;
@@ -439,16 +463,21 @@ TARN_INLINE void Block(const std::uint8_t* s, std::uint8_t* d, typename Lanes<V>
   if constexpr (Dst::kBytes == 2 && kGroups == 2) {
     const typename L::I32 r[kGroups] = {Group<V, Src, Dst, kDither, kGs>(s, raw, s0)...};
     const auto b = __builtin_convertvector(Concat(r[0], r[1]), typename L::I16w);
-    std::memcpy(d, &b, sizeof b);
+    if constexpr (kStream)
+      StreamStore(d, b);
+    else
+      std::memcpy(d, &b, sizeof b);
   } else {
-    (Store<V, Dst>(d + kGs * V * Dst::kBytes, Group<V, Src, Dst, kDither, kGs>(s, raw, s0)), ...);
+    (Store<V, Dst, kStream>(d + kGs * V * Dst::kBytes,
+                            Group<V, Src, Dst, kDither, kGs>(s, raw, s0)),
+     ...);
   }
 }
 
 // Converts whole blocks: four groups for 8-bit sources and two for 16-bit
 // sources or destinations (one 4V-byte load or store each), one otherwise.
-template <int V, class Src, class Dst, bool kDither>
-TARN_INLINE int Body(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) {
+template <int V, class Src, class Dst, bool kDither, bool kStream>
+TARN_INLINE int Blocks(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) {
   using U32 = typename Lanes<V>::U32;
   constexpr int kGroups = std::max(kPerVector<Src>, Dst::kBytes == 2 ? 2 : 1);
   constexpr bool kPacked = Src::kBytes == 3 || Dst::kBytes == 3;
@@ -465,25 +494,46 @@ TARN_INLINE int Body(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_
   }
   int i = 0;
   for (; i <= last; i += kStep) {
-    Block<V, Src, Dst, kDither>(s + static_cast<std::ptrdiff_t>(i) * Src::kBytes,
-                                d + static_cast<std::ptrdiff_t>(i) * Dst::kBytes, s0,
-                                std::make_integer_sequence<int, kGroups>());
+    Block<V, Src, Dst, kDither, kStream>(s + static_cast<std::ptrdiff_t>(i) * Src::kBytes,
+                                         d + static_cast<std::ptrdiff_t>(i) * Dst::kBytes, s0,
+                                         std::make_integer_sequence<int, kGroups>());
   }
   if constexpr (kDither) *state = s0[0];
+#if TARN_CONVERTER_X86
+  if constexpr (kStream) __builtin_ia32_sfence();
+#endif
   return i;
 }
 
+// Streaming stores apply where every store is one whole vector at a
+// vector-aligned offset: 4-byte destinations and paired 16-bit groups.
+template <int V, class Src, class Dst>
+inline constexpr bool kCanStream = TARN_CONVERTER_X86 && (Dst::kBytes == 4 || Dst::kBytes == 2) &&
+                                   !(Dst::kBytes == 2 && kPerVector<Src> == 4);
+
+template <int V, class Src, class Dst, bool kDither>
+TARN_INLINE int Body(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state,
+                     bool stream) {
+  if constexpr (kCanStream<V, Src, Dst>) {
+    if (stream && reinterpret_cast<std::uintptr_t>(d) % (4 * V) == 0) {
+      return Blocks<V, Src, Dst, kDither, true>(s, d, n, state);
+    }
+  }
+  return Blocks<V, Src, Dst, kDither, false>(s, d, n, state);
+}
+
 template <class Src, class Dst, bool kDither>
-int RunBaseline(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state) noexcept {
-  return Body<4, Src, Dst, kDither>(s, d, n, state);
+int RunBaseline(const std::uint8_t* s, std::uint8_t* d, int n, std::uint32_t* state,
+                bool stream) noexcept {
+  return Body<4, Src, Dst, kDither>(s, d, n, state, stream);
 }
 
 #if TARN_CONVERTER_X86
 // SSE4.1 brings the byte shuffle that 8-bit and packed 24-bit data need.
 template <class Src, class Dst, bool kDither>
 __attribute__((target("sse4.1"))) int RunSse41(const std::uint8_t* s, std::uint8_t* d, int n,
-                                               std::uint32_t* state) noexcept {
-  return Body<4, Src, Dst, kDither>(s, d, n, state);
+                                               std::uint32_t* state, bool stream) noexcept {
+  return Body<4, Src, Dst, kDither>(s, d, n, state, stream);
 }
 
 bool CpuHasSse41() noexcept {
@@ -498,8 +548,8 @@ bool CpuHasSse41() noexcept {
 #if TARN_CONVERTER_AVX2
 template <class Src, class Dst, bool kDither>
 __attribute__((target("avx2"))) int RunAvx2(const std::uint8_t* s, std::uint8_t* d, int n,
-                                            std::uint32_t* state) noexcept {
-  return Body<8, Src, Dst, kDither>(s, d, n, state);
+                                            std::uint32_t* state, bool stream) noexcept {
+  return Body<8, Src, Dst, kDither>(s, d, n, state, stream);
 }
 
 bool CpuHasAvx2() noexcept {

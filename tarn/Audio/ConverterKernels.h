@@ -16,8 +16,14 @@
 
 namespace tarn::ConverterKernels {
 
+// `stream` asks for stores that bypass the caches, for runs far larger than
+// the caches; it takes effect only where the destination is aligned to the
+// vector size and every store is one whole vector, and is ignored otherwise.
 using Kernel = int (*)(const std::uint8_t* source, std::uint8_t* destination, int count,
-                       std::uint32_t* ditherState) noexcept;
+                       std::uint32_t* ditherState, bool stream) noexcept;
+
+// Destination runs of at least this many bytes are worth streaming.
+inline constexpr long long kStreamingBytes = 4 << 20;
 
 // Which kernels converters use: none (per-sample rules only), the
 // architecture's baseline vector code (SSE2 for pairs of 4-byte formats,

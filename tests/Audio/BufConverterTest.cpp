@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <climits>
 
 #include "ConverterTestUtil.h"
@@ -191,6 +192,51 @@ TEST(BufConverterBlocks, SizesAlignmentsAndGuards) {
                 }
               }
             }
+          }
+        }
+      }
+    }
+  }
+}
+
+// Runs long enough for stores that bypass the caches, at destination offsets
+// that reach a vector boundary after a few samples (or never), with guards.
+TEST(BufConverterBlocks, LongRunsAtSeveralAlignments) {
+  LevelRestorer restore;
+  std::mt19937_64 rng(11);
+  for (int from = 0; from <= 5; ++from) {
+    for (int to : {2, 4, 5}) {
+      const Family family = Expected(from, to);
+      if (family == Family::kNone) continue;
+      const int in = convref::BytesOf(from), out = convref::BytesOf(to);
+      const int count = static_cast<int>(tarn::ConverterKernels::kStreamingBytes / out) + 37;
+      std::vector<std::uint8_t> src;
+      if (from == 5) {
+        std::vector<float> f(static_cast<std::size_t>(count));
+        for (float& x : f) x = RandomFloat(rng);
+        src = FloatBytes(f);
+      } else {
+        src = RandomBytes(rng, static_cast<std::size_t>(count) * in);
+      }
+      for (int dither = 0; dither <= (family == Family::kDitherable ? 1 : 0); ++dither) {
+        for (int dstOff : {0, 2, 12}) {
+          for (KernelLevel level : {KernelLevel::kExtended, KernelLevel::kBest}) {
+            SetKernelLevel(level);
+            Made made = CreateKnownSeed(from, to, dither);
+            convref::Generator gen{made.seed};
+            const auto want = convref::ConvertRun(from, to, dither ? &gen : nullptr, src, count);
+            std::vector<std::uint8_t> dst(want.size() + 128, 0x5A);
+            // Start from a 64-byte boundary plus the offset.
+            const std::size_t base = (64 - reinterpret_cast<std::uintptr_t>(dst.data()) % 64) % 64;
+            ASSERT_GE(dst.size(), base + dstOff + want.size());
+            made.converter->Convert(src.data(), dst.data() + base + dstOff, count);
+            EXPECT_TRUE(std::equal(want.begin(), want.end(), dst.begin() + base + dstOff))
+                << from << "->" << to << " dither " << dither << " offset " << dstOff << " "
+                << LevelName(level);
+            EXPECT_TRUE(std::all_of(dst.begin(), dst.begin() + base + dstOff,
+                                    [](std::uint8_t b) { return b == 0x5A; }));
+            EXPECT_TRUE(std::all_of(dst.begin() + base + dstOff + want.size(), dst.end(),
+                                    [](std::uint8_t b) { return b == 0x5A; }));
           }
         }
       }
