@@ -14,11 +14,10 @@
 // branches on the format per sample; out-of-range values clip, a float NaN
 // converts as 0.0 would and infinities clip to full scale. Runs whose
 // destination spans 4 MiB or more are written with stores that bypass the
-// caches. A dithered
-// converter advances its generator by two steps per sample and keeps its
-// state across calls, so block boundaries do not restart the sequence. A
-// converter is used by one thread at a time; distinct converters share
-// nothing.
+// caches. A dithered converter advances its generator by two steps per
+// sample and keeps its state across calls, so block boundaries do not
+// restart the sequence. A converter is used by one thread at a time;
+// distinct converters share nothing.
 #pragma once
 
 #include <memory>
