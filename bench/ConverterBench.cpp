@@ -18,7 +18,7 @@
 #include <vector>
 
 #include "tarn/Audio/BufConverter.h"
-#include "tarn/Audio/ConverterKernels.h"
+#include "tarn/Audio/ConverterKernelsImpl.h"
 
 namespace {
 

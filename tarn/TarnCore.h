@@ -2,9 +2,12 @@
 #pragma once
 
 #include "tarn/Audio/AudioReadWriteBuffer.h"
+#include "tarn/Audio/BufConverter.h"
+#include "tarn/Audio/Dither.h"
 #include "tarn/Audio/FunctionGenerator.h"
 #include "tarn/Audio/MultiBuffer.h"
 #include "tarn/Audio/SampleBuffer.h"
+#include "tarn/Audio/SampleFormat.h"
 
 #include "tarn/Basics/ConstantString.h"
 #include "tarn/Basics/Endian.h"
@@ -40,14 +43,21 @@
 #include "tarn/String/UStringFunctions.h"
 #include "tarn/String/UTraits.h"
 
+#include "tarn/Threads/AtomicStack.h"
+#include "tarn/Threads/CIdleChore.h"
+#include "tarn/Threads/CircularBuffer.h"
 #include "tarn/Threads/TarnAtomic.h"
 #include "tarn/Threads/TarnConditionVariable.h"
+#include "tarn/Threads/TarnJobQueueJob.h"
+#include "tarn/Threads/TarnJobThread.h"
+#include "tarn/Threads/TarnMainThread.h"
 #include "tarn/Threads/TarnMutex.h"
 #include "tarn/Threads/TarnSemaphore.h"
 #include "tarn/Threads/TarnThread.h"
 #include "tarn/Threads/TarnThreadID.h"
 #include "tarn/Threads/TarnThreadLocal.h"
 #include "tarn/Threads/TarnWorkerThread.h"
+#include "tarn/Threads/blocking_queue.h"
 
 #include "tarn/Time/AddPin.h"
 #include "tarn/Time/FixedUtils.h"

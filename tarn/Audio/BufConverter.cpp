@@ -3,8 +3,8 @@
 #include <cstdint>
 #include <type_traits>
 
-#include "tarn/Audio/ConverterKernels.h"
-#include "tarn/Audio/ConverterRules.h"
+#include "tarn/Audio/ConverterKernelsImpl.h"
+#include "tarn/Audio/ConverterRulesImpl.h"
 #include "tarn/Errors/Fail.h"
 
 namespace tarn {

@@ -1,7 +1,7 @@
 // Vector kernels of the buffer converter, written once with the compiler's
 // generic vector types and compiled per instruction set. Every lane operation
 // is the IEEE or two's-complement operation of the per-sample rule it stands
-// for, so results match ConverterRules.h bit for bit:
+// for, so results match ConverterRulesImpl.h bit for bit:
 // - integer to float: the integer converts exactly (16-bit) or with one
 //   round-to-nearest (24-bit words), and the scale is a power of two, so the
 //   product equals the exact quotient rounded once, as the rules require;
@@ -13,7 +13,7 @@
 // - dither: each lane runs the generator from its own starting point, found
 //   by jumping the linear congruence ahead, so lane k of a group draws the
 //   value the scalar generator would draw for sample k of that group.
-#include "tarn/Audio/ConverterKernels.h"
+#include "tarn/Audio/ConverterKernelsImpl.h"
 
 #include <algorithm>
 #include <atomic>
@@ -21,7 +21,7 @@
 #include <cstring>
 #include <utility>
 
-#include "tarn/Audio/ConverterRules.h"
+#include "tarn/Audio/ConverterRulesImpl.h"
 
 #if defined(__x86_64__)
 #include <immintrin.h>  // declares the streaming-store builtins for GCC

@@ -14,7 +14,7 @@
 
 #include "ConverterReference.h"
 #include "tarn/Audio/BufConverter.h"
-#include "tarn/Audio/ConverterKernels.h"
+#include "tarn/Audio/ConverterKernelsImpl.h"
 #include "tarn/Time/TarnSystemTime.h"
 
 namespace convtest {

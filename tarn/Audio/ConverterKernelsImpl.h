@@ -2,7 +2,7 @@
 //
 // A kernel converts a prefix of a run with vector instructions and returns
 // how many samples it converted; the caller converts the rest with the
-// per-sample rules of ConverterRules.h. Every kernel produces results
+// per-sample rules of ConverterRulesImpl.h. Every kernel produces results
 // bit-identical to those rules. Dithered kernels draw the same dither values
 // in the same order as the scalar generator and leave `*ditherState` where
 // the scalar generator would be after the converted prefix.
