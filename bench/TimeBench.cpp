@@ -4,6 +4,8 @@
 // by CPU time, which is steadier than wall time on a shared machine.
 #include <benchmark/benchmark.h>
 
+#include "RatioReporter.h"
+
 #include <boost/icl/interval_set.hpp>
 #include <cstdint>
 #include <cstdio>
@@ -38,7 +40,7 @@ const std::vector<Edit>& Edits() {
   return edits;
 }
 
-void Ours_RegionEdits(benchmark::State& state) {
+void RegionEdits_Tarn(benchmark::State& state) {
   for (auto _ : state) {
     tarn::TimeRegion region;
     for (const Edit& e : Edits()) {
@@ -51,9 +53,9 @@ void Ours_RegionEdits(benchmark::State& state) {
     benchmark::DoNotOptimize(region.CountRanges());
   }
 }
-BENCHMARK(Ours_RegionEdits);
+BENCHMARK(RegionEdits_Tarn);
 
-void Peer_RegionEdits(benchmark::State& state) {
+void RegionEdits_BoostICLIntervalSet(benchmark::State& state) {
   for (auto _ : state) {
     boost::icl::interval_set<int> set;
     for (const Edit& e : Edits()) {
@@ -66,9 +68,9 @@ void Peer_RegionEdits(benchmark::State& state) {
     benchmark::DoNotOptimize(boost::icl::interval_count(set));
   }
 }
-BENCHMARK(Peer_RegionEdits);
+BENCHMARK(RegionEdits_BoostICLIntervalSet);
 
-void Ours_RegionLookups(benchmark::State& state) {
+void RegionLookups_Tarn(benchmark::State& state) {
   tarn::TimeRegion region;
   for (const Edit& e : Edits()) region.Add({e.start, e.end});
   int t = 0;
@@ -77,9 +79,9 @@ void Ours_RegionLookups(benchmark::State& state) {
     benchmark::DoNotOptimize(region.IncludesTime(t));
   }
 }
-BENCHMARK(Ours_RegionLookups);
+BENCHMARK(RegionLookups_Tarn);
 
-void Peer_RegionLookups(benchmark::State& state) {
+void RegionLookups_BoostICLContains(benchmark::State& state) {
   boost::icl::interval_set<int> set;
   for (const Edit& e : Edits()) set += boost::icl::interval<int>::right_open(e.start, e.end);
   int t = 0;
@@ -88,9 +90,9 @@ void Peer_RegionLookups(benchmark::State& state) {
     benchmark::DoNotOptimize(boost::icl::contains(set, t));
   }
 }
-BENCHMARK(Peer_RegionLookups);
+BENCHMARK(RegionLookups_BoostICLContains);
 
-void Ours_TockFracSums(benchmark::State& state) {
+void TockFracSums_Tarn(benchmark::State& state) {
   std::vector<tarn::TockFrac> steps;
   for (int i = 0; i < 1024; ++i) steps.emplace_back(i % 3 - 1, (i * 7777) % 7200000 - 3600000);
   for (auto _ : state) {
@@ -99,10 +101,10 @@ void Ours_TockFracSums(benchmark::State& state) {
     benchmark::DoNotOptimize(sum);
   }
 }
-BENCHMARK(Ours_TockFracSums);
+BENCHMARK(TockFracSums_Tarn);
 
 // The peer keeps one 64-bit count of tocks and never normalises.
-void Peer_TockFracSums(benchmark::State& state) {
+void TockFracSums_PlainInt64Tocks(benchmark::State& state) {
   std::vector<std::int64_t> steps;
   for (int i = 0; i < 1024; ++i)
     steps.push_back(std::int64_t{i % 3 - 1} * 7200000 + (i * 7777) % 7200000 - 3600000);
@@ -114,38 +116,8 @@ void Peer_TockFracSums(benchmark::State& state) {
     }
   }
 }
-BENCHMARK(Peer_TockFracSums);
-
-class RatioReporter : public benchmark::ConsoleReporter {
- public:
-  void ReportRuns(const std::vector<Run>& runs) override {
-    for (const Run& r : runs) times_[r.benchmark_name()] = r.GetAdjustedCPUTime();
-    ConsoleReporter::ReportRuns(runs);
-  }
-  void PrintRatios() const {
-    const char* pairs[][3] = {
-        {"RegionEdits", "TimeRegion add/subtract", "boost::icl::interval_set"},
-        {"RegionLookups", "TimeRegion::IncludesTime", "boost::icl::contains"},
-        {"TockFracSums", "TockFrac +=", "int64 tock count (no normalising)"}};
-    for (const auto& p : pairs) {
-      const auto ours = times_.find(std::string("Ours_") + p[0]);
-      const auto peer = times_.find(std::string("Peer_") + p[0]);
-      if (ours == times_.end() || peer == times_.end()) continue;
-      std::printf("%-26s ours/peer = %.2f  (peer: %s)\n", p[1], ours->second / peer->second, p[2]);
-    }
-  }
-
- private:
-  std::map<std::string, double> times_;
-};
+BENCHMARK(TockFracSums_PlainInt64Tocks);
 
 }  // namespace
 
-int main(int argc, char** argv) {
-  benchmark::Initialize(&argc, argv);
-  RatioReporter reporter;
-  benchmark::RunSpecifiedBenchmarks(&reporter);
-  reporter.PrintRatios();
-  benchmark::Shutdown();
-  return 0;
-}
+int main(int argc, char** argv) { return tarn_bench::RunWithRatios(argc, argv); }

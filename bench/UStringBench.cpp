@@ -2,8 +2,10 @@
 // conversions (u_strFromUTF8 / u_strToUTF8) and glibc's strverscmp. Prints
 // ours / peer time ratios at the end.
 #include <benchmark/benchmark.h>
+
 #include <string.h>
 #include <unicode/ustring.h>
+#include "RatioReporter.h"
 
 #include <algorithm>
 #include <cstdio>
@@ -108,41 +110,6 @@ BENCHMARK(NaturalSort_Tarn);
 BENCHMARK(NaturalSort_strverscmp);
 
 // Collects per-benchmark times so that ours / peer ratios can be printed.
-class RatioReporter : public benchmark::ConsoleReporter {
- public:
-  void ReportRuns(const std::vector<Run>& runs) override {
-    for (const Run& r : runs) {
-      if (r.run_type == Run::RT_Iteration && r.iterations > 0) {
-        times_[r.benchmark_name()] = r.GetAdjustedRealTime();
-      }
-    }
-    ConsoleReporter::ReportRuns(runs);
-  }
-  void PrintRatios() const {
-    for (const auto& [name, t] : times_) {
-      const auto tarnAt = name.find("_Tarn");
-      if (tarnAt == std::string::npos) continue;
-      const std::string stem = name.substr(0, tarnAt + 1);
-      for (const auto& [peer, pt] : times_) {
-        if (peer != name && peer.rfind(stem, 0) == 0) {
-          std::printf("%s: ours / %s = %.2f\n", stem.substr(0, stem.size() - 1).c_str(),
-                      peer.substr(stem.size()).c_str(), t / pt);
-        }
-      }
-    }
-  }
-
- private:
-  std::map<std::string, double> times_;
-};
-
 }  // namespace
 
-int main(int argc, char** argv) {
-  benchmark::Initialize(&argc, argv);
-  RatioReporter reporter;
-  benchmark::RunSpecifiedBenchmarks(&reporter);
-  reporter.PrintRatios();
-  benchmark::Shutdown();
-  return 0;
-}
+int main(int argc, char** argv) { return tarn_bench::RunWithRatios(argc, argv); }
