@@ -68,6 +68,7 @@ TEST_F(TarnSystemTimeUtc, DatesMatchCalendarRoundTripAndRejectNonexistentOnes) {
   }
   EXPECT_EQ(ToSeconds(Date(1904, -3, -7)), 0u);  // month and day below 1 read as 1
   EXPECT_EQ(ToDate(0xFFFFFFFFu), Date(2040, 2, 6, 6, 28, 15, 1));
+  EXPECT_EQ(ToDate(ToSeconds(Date(2000, 2, 29, 23, 59, 59))), Date(2000, 2, 29, 23, 59, 59, 2));
   for (std::uint64_t s = 0; s <= 0xFFFFFFFFu; s += 0x00F0F0F1u) {
     ASSERT_EQ(ToSeconds(ToDate(static_cast<unsigned>(s))), s);
   }
