@@ -5,12 +5,10 @@
 
 #include <optional>
 #include <ostream>
-#include <string>
 
 #include "tarn/Errors/TarnError.h"
 
 namespace tarn {
-// Prints errors in test failures as their one-line description.
 inline void PrintTo(const TarnError& error, std::ostream* os) { *os << error.Describe(); }
 }  // namespace tarn
 
@@ -27,14 +25,11 @@ std::optional<TarnError> Thrown(Fn&& fn) {
   return std::nullopt;
 }
 
-// Compares every field but the attachment, printing them on failure.
-inline void ExpectFields(const TarnError& e, const char* kind, const char* system,
-                         const char* subsystem, int code, const char* errorString) {
-  EXPECT_EQ(e.GetKind().str(), kind);
-  EXPECT_EQ(e.GetSystem().str(), system);
-  EXPECT_EQ(e.GetSubsystem().str(), subsystem);
-  EXPECT_EQ(e.GetIntErrorCode(), code);
-  EXPECT_EQ(e.GetOptionalErrorString().str(), errorString);
+// Compares every field but the attachment against an error built from them.
+inline void ExpectFields(const std::optional<TarnError>& e, const char* kind, const char* system,
+                         const char* subsystem, int code, const char* text = "") {
+  ASSERT_TRUE(e) << "nothing thrown";
+  EXPECT_EQ(*e, TarnError(kind, system, subsystem, code, text));
 }
 
 }  // namespace tarn::testing
