@@ -1,11 +1,14 @@
 // CompareFlags contract: case, accents, the alternate case bit, the natural
-// ordering of the library's own comparison, and the -1/0/1 result range.
+// ordering of the library's own comparison, the -1/0/1 result range, and
+// comparisons and conversions from several threads at once.
 #include <gtest/gtest.h>
 
-#include <algorithm>
+#include <atomic>
+#include <thread>
+#include <tuple>
 #include <vector>
 
-#include "tarn/String/UString.h"
+#include "String/StringTestUtil.h"
 
 namespace tarn {
 namespace {
@@ -13,96 +16,96 @@ namespace {
 using F = UString::CompareFlags;
 constexpr F Flags(unsigned f) { return static_cast<F>(f); }
 
-UString U(const char* utf8) { return UString(utf8); }
-
-TEST(UStringCompare, CaseFlags) {
-  const UString a("abc"), b("ABC");
-  for (unsigned base : {0u, 32u}) {
-    EXPECT_FALSE(a.equal(b, Flags(base))) << base;
-    EXPECT_TRUE(a.equal(b, Flags(base | 1))) << base;
-    EXPECT_TRUE(a.equal(b, Flags(base | 64))) << base;
-    EXPECT_TRUE(a.equal(b, Flags(base | 65))) << base;
-    EXPECT_TRUE(a.equal(a, Flags(base))) << base;
-  }
-  EXPECT_TRUE(a.equal(b, UString::kIgnoreCase | UString::kLibraryCompare));
-}
-
-TEST(UStringCompare, AccentFlags) {
-  const UString accented = U("r\u00E9sum\u00E9"), plain("resume"), upper("RESUME");
-  const UString decomposed = U("re\u0301sume\u0301");
-  for (unsigned base : {0u, 32u}) {
-    EXPECT_FALSE(accented.equal(plain, Flags(base))) << base;
-    EXPECT_TRUE(accented.equal(plain, Flags(base | 2))) << base;
-    EXPECT_FALSE(accented.equal(upper, Flags(base | 2))) << base;  // case still counts
-    EXPECT_TRUE(accented.equal(upper, Flags(base | 3))) << base;
-    EXPECT_TRUE(accented.equal(upper, Flags(base | 66))) << base;
-    EXPECT_TRUE(decomposed.equal(plain, Flags(base | 2))) << base;
+// Over every combination of the flag bits. A pair differs in case (1), in
+// accents (2) or in letters (4); case differences vanish with bit 1 or 64,
+// accent differences with bit 2, letter differences never.
+TEST(UStringCompare, CaseAndAccentFlags) {
+  const char *accented = "r\u00E9sum\u00E9", *decomposed = "re\u0301sume\u0301";
+  const char* const left[] = {"abc", "abc", accented, decomposed, accented, "abc"};
+  const char* const right[] = {"abc", "ABC", "resume", "resume", "RESUME", "ABD"};
+  const unsigned differs[] = {0, 1, 2, 2, 3, 5};
+  for (std::size_t i = 0; i < std::size(left); ++i) {
+    for (unsigned f : {0u, 1u, 2u, 3u, 64u, 65u, 66u, 67u}) {
+      const unsigned d = differs[i];
+      const bool equal = !(d & 4) && (!(d & 1) || (f & 65)) && (!(d & 2) || (f & 2));
+      for (unsigned g : {f, f | 32}) {
+        EXPECT_EQ(UString(left[i]).equal(UString(right[i]), Flags(g)), equal) << i << ' ' << g;
+      }
+    }
   }
 }
 
-TEST(UStringCompare, SystemComparisonIsLinguisticNotCodeUnit) {
-  // In code units 'B' < 'a'; a collation puts a before B.
-  EXPECT_TRUE(UString("B") < UString("a"));
+TEST(UStringCompare, SystemComparisonIsLinguisticAndOperatorsUseCodeUnits) {
+  EXPECT_TRUE(UString("B") < UString("a"));  // code units
   EXPECT_TRUE(UString("a").less(UString("B")));
   EXPECT_TRUE(UString("apple").less(UString("Banana"), UString::kIgnoreCase));
-  EXPECT_TRUE(U("\u00E9clair").less(UString("fig")));  // e-acute sorts with e
-  EXPECT_FALSE(UString("fig").less(U("\u00E9clair")));
+  EXPECT_TRUE(UString("\u00E9clair").less(UString("fig")));  // e-acute sorts with e
+  EXPECT_TRUE(UString("ABC") < UString("abc") && UString("ab") < UString("abc"));
+  EXPECT_LT(UString("a").compare(UString("b")), 0);
 }
 
 TEST(UStringCompare, ResultIsMinusOneZeroOrOneAndAntisymmetric) {
-  const std::vector<UString> words = {UString(""),        UString("a"),     UString("A"),
-                                      UString("ab"),      UString("file2"), UString("file10"),
-                                      U("\u00C9t\u00E9"), UString("zz"),    UString("Z9")};
+  std::vector<UString> words = test::Split("a A ab file2 file10 zz Z9 \u00C9t\u00E9");
+  words.push_back(UString());
   for (unsigned f : {0u, 1u, 2u, 3u, 32u, 33u, 34u, 35u, 64u, 96u}) {
     for (const UString& x : words) {
       for (const UString& y : words) {
         const int c = x.Compare(y, Flags(f));
         EXPECT_TRUE(c == -1 || c == 0 || c == 1) << c;
         EXPECT_EQ(c, -y.Compare(x, Flags(f))) << x << " / " << y << " flags " << f;
-        EXPECT_EQ(x.less(y, Flags(f)), c < 0);
-        EXPECT_EQ(x.equal(y, Flags(f)), c == 0);
       }
     }
   }
-  EXPECT_EQ(UString("").Compare(UString("a"), Flags(0)), -1);
-  EXPECT_EQ(UString("").Compare(UString("a"), Flags(32)), -1);
-  EXPECT_EQ(UString("").Compare(UString(""), Flags(32)), 0);
 }
 
+// Each chain is in ascending natural order (the first starts with the empty
+// string), and every pair must compare so.
+// Digit runs compare by value, equal values with fewer leading zeros first but
+// only as a tie-break (the first such run decides); other units by code unit
+// unless case is ignored.
 TEST(UStringCompare, NaturalOrderComparesDigitRunsByValue) {
-  const F nat = UString::kLibraryCompare;
-  EXPECT_EQ(UString("file2").Compare(UString("file10"), nat), -1);
-  EXPECT_EQ(UString("file10").Compare(UString("file9"), nat), 1);
-  EXPECT_EQ(UString("a1b2").Compare(UString("a1b10"), nat), -1);
-  EXPECT_EQ(UString("x").Compare(UString("x1"), nat), -1);
-  EXPECT_EQ(UString("v1.10").Compare(UString("v1.9"), nat), 1);
-  EXPECT_EQ(UString("n123456789012345678901234567890").Compare(UString("n99"), nat), 1);
-  EXPECT_EQ(UString("n99999999999999999999").Compare(UString("n99999999999999999998"), nat), 1);
-  // Equal values: the run with fewer leading zeros first, but only as a tie-break.
-  EXPECT_EQ(UString("file2").Compare(UString("file02"), nat), -1);
-  EXPECT_EQ(UString("file02b").Compare(UString("file2c"), nat), -1);
-  EXPECT_EQ(UString("t0").Compare(UString("t00"), nat), -1);
-  // Plain code units outside digit runs; case folding on request.
-  EXPECT_EQ(UString("file2").Compare(UString("FILE10"), nat), 1);
-  EXPECT_EQ(UString("file2").Compare(UString("FILE10"), nat | UString::kIgnoreCase), -1);
-
-  std::vector<UString> names = {UString("Take 10"), UString("take 9"), UString("Take 1"),
-                                UString("take 100"), UString("Take 09b")};
-  std::sort(names.begin(), names.end(), [](const UString& a, const UString& b) {
-    return a.less(b, UString::kLibraryCompare | UString::kIgnoreCase);
-  });
-  EXPECT_EQ(names, (std::vector<UString>{UString("Take 1"), UString("take 9"), UString("Take 09b"),
-                                         UString("Take 10"), UString("take 100")}));
+  const auto exact = test::Split(
+      " FILE10 a1b01 a01b1 a1b2 a1b10 file2 file02 file02b file2c file9 file10 n99 "
+      "n99999999999999999998 n99999999999999999999 n12345678901234567890123 t0 t00 x x1");
+  const auto folded = test::Split("file2 FILE10 Take_1 take_9 Take_09b Take_10 take_100");
+  for (const auto& [chain, flags] :
+       {std::pair{exact, UString::kLibraryCompare},
+        std::pair{folded, UString::kLibraryCompare | UString::kIgnoreCase}}) {
+    for (std::size_t i = 0; i < chain.size(); ++i) {
+      for (std::size_t j = 0; j < chain.size(); ++j) {
+        const int want = i < j ? -1 : i > j;
+        EXPECT_EQ(chain[i].Compare(chain[j], flags), want) << chain[i] << " / " << chain[j];
+      }
+    }
+  }
 }
 
-TEST(UStringCompare, PlainOperatorsUseCodeUnits) {
-  EXPECT_TRUE(UString("abc") == UString("abc"));
-  EXPECT_TRUE(UString("abc") != UString("ABC"));
-  EXPECT_TRUE(UString("ABC") < UString("abc"));
-  EXPECT_TRUE(UString("ab") < UString("abc"));
-  EXPECT_TRUE(UString("b") > UString("abc"));
-  EXPECT_LT(UString("a").compare(UString("b")), 0);
-  EXPECT_TRUE(UString("x") == "x");
+// Conversions and comparisons from many threads at once must give the same
+// answers as one thread (no shared converter or collator state).
+TEST(UStringThreads, ConcurrentConversionsAndComparisons) {
+  const std::string bytes = test::AllBytes();
+  const UString a("R\xC3\xA9sum\xC3\xA9 take 2"), b("resume TAKE 10");
+  const F folded = UString::kIgnoreCase | UString::kIgnoreNonSpace;
+  const auto work = [&] {
+    UString upper = a;
+    ToUpper(upper);
+    return std::tuple(UString(bytes, UString::kMacRomanEncoding).string(UString::kMacRomanEncoding),
+                      UString(bytes, UString::kSystemEncoding).utf8_str(), upper.utf8_str(),
+                      a.Compare(b, UString::kCompareDefault), a.Compare(b, folded),
+                      a.Compare(b, UString::kLibraryCompare | folded));
+  };
+  const auto expected = work();
+  std::atomic<int> mismatches{0};
+  std::vector<std::thread> threads;
+  for (int t = 0; t < 4; ++t) {
+    threads.emplace_back([&] {
+      for (int i = 0; i < 300; ++i) mismatches += work() != expected;
+    });
+  }
+  for (auto& th : threads) th.join();
+  EXPECT_EQ(mismatches.load(), 0);
+  EXPECT_EQ(std::get<4>(expected), 1);   // "resume take 2" vs "resume take 10": '2' > '1'
+  EXPECT_EQ(std::get<5>(expected), -1);  // naturally 2 < 10
 }
 
 }  // namespace

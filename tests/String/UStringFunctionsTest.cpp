@@ -2,295 +2,207 @@
 // codes, NFKC and truncating concatenation.
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <bit>
 #include <cmath>
 #include <cstdint>
-#include <cstring>
 #include <limits>
 
-#include "String/TestTimeZone.h"
+#include "String/StringTestUtil.h"
 #include "tarn/Errors/TarnError.h"
 #include "tarn/String/UString.h"
 
 namespace tarn {
 namespace {
 
-using Units = std::vector<unsigned short>;
+using test::Rows;
+using test::Units;
+using Unit = unsigned short;
+using I64 = std::numeric_limits<std::int64_t>;
+using I32 = std::numeric_limits<std::int32_t>;
 UString U(const char* utf8) { return UString(utf8); }
 
-TEST(UStringFunctions, CharacterClasses) {
-  EXPECT_TRUE(IsASCII(0x7F));
-  EXPECT_FALSE(IsASCII(0x80));
-  EXPECT_TRUE(IsDigit('0') && IsDigit('9'));
-  EXPECT_FALSE(IsDigit('/') || IsDigit(':') || IsDigit(0x0663));  // Arabic-Indic three
-  EXPECT_TRUE(IsXDigit('f') && IsXDigit('F') && IsXDigit('7'));
-  EXPECT_FALSE(IsXDigit('g') || IsXDigit('G'));
-  EXPECT_TRUE(IsLower('a') && IsLower(0xE9) && IsLower(0x3C9));  // e-acute, omega
-  EXPECT_TRUE(IsUpper('A') && IsUpper(0xC9) && IsUpper(0x3A9));
-  EXPECT_FALSE(IsLower('A') || IsUpper('a') || IsLower('1') || IsUpper('1'));
-  for (unsigned short c :
-       {0x09, 0x0A, 0x0B, 0x0C, 0x0D, 0x20, 0x85, 0xA0, 0x2000, 0x200A, 0x2028, 0x3000}) {
-    EXPECT_TRUE(IsSpace(c)) << c;
+TEST(UStringFunctions, SpaceAndLineTerminatorOverEveryUnit) {
+  for (unsigned c = 0; c <= 0xFFFF; ++c) {
+    const bool terminator = c == '\n' || c == '\r' || c == 0x85 || c == 0x2028 || c == 0x2029;
+    const bool space = terminator || (c >= 9 && c <= 13) || c == ' ' || c == 0xA0 || c == 0x1680 ||
+                       (c >= 0x2000 && c <= 0x200A) || c == 0x202F || c == 0x205F || c == 0x3000;
+    ASSERT_EQ(IsSpace(static_cast<unsigned short>(c)), space) << std::hex << c;
+    ASSERT_EQ(IsLineTerminator(static_cast<unsigned short>(c)), terminator) << std::hex << c;
   }
-  for (unsigned short c : {0x08, 0x0E, 0x1F, 0x61, 0x200B, 0xFEFF}) EXPECT_FALSE(IsSpace(c)) << c;
-  EXPECT_TRUE(IsLineTerminator('\n') && IsLineTerminator('\r') && IsLineTerminator(0x2028));
-  EXPECT_FALSE(IsLineTerminator(' ') || IsLineTerminator('\t'));
 }
 
-TEST(UStringFunctions, CaseMapping) {
-  EXPECT_EQ(ToUpper('a'), 'A');
-  EXPECT_EQ(ToLower('Z'), 'z');
-  EXPECT_EQ(ToUpper(0xE9), 0xC9);
-  EXPECT_EQ(ToLower(0x130 + 0x2E), 0x15F);  // S-cedilla
-  EXPECT_EQ(ToUpper('1'), '1');
-  EXPECT_EQ(ToUpper(0xD83D), 0xD83D);  // lone surrogate unchanged
+TEST(UStringFunctions, CaseAndWholeStringTests) {
+  // Lower/upper pairs: ASCII, e-acute, omega, S-cedilla; digits and a lone
+  // surrogate are neither and map to themselves.
+  const Unit lower[] = {'a', 0xE9, 0x3C9, 0x15F, '1', 0xD83D};
+  const Unit upper[] = {'A', 0xC9, 0x3A9, 0x15E, '1', 0xD83D};
+  for (std::size_t i = 0; i < std::size(lower); ++i) {
+    EXPECT_EQ(ToUpper(lower[i]), upper[i]);
+    EXPECT_EQ(ToLower(upper[i]), lower[i]);
+    EXPECT_EQ(IsLower(lower[i]) && IsUpper(upper[i]), lower[i] != upper[i]) << lower[i];
+    EXPECT_FALSE(IsLower(upper[i]) || IsUpper(lower[i])) << lower[i];
+  }
   UString s = U("h\u00E9llo W\u00D6RLD 42");
   ToUpper(s);
   EXPECT_EQ(s, U("H\u00C9LLO W\u00D6RLD 42"));
   ToLower(s);
   EXPECT_EQ(s, U("h\u00E9llo w\u00F6rld 42"));
-}
-
-TEST(UStringFunctions, WholeStringTests) {
   EXPECT_TRUE(IsNumeric(UString("0123456789")));
-  EXPECT_FALSE(IsNumeric(UString("")));
-  EXPECT_FALSE(IsNumeric(UString("12a")));
-  EXPECT_FALSE(IsNumeric(UString("-1")));
-  EXPECT_TRUE(IsStringWhitespace(UString(" \t\r\n")));
-  EXPECT_TRUE(IsStringWhitespace(UString("")));
-  EXPECT_TRUE(IsStringWhitespace(U("\u3000\u00A0")));
+  EXPECT_FALSE(IsNumeric(UString("")) || IsNumeric(UString("12a")) || IsNumeric(UString("-1")));
+  EXPECT_TRUE(IsStringWhitespace(UString("")) && IsStringWhitespace(U(" \t\r\n\u3000\u00A0")));
   EXPECT_FALSE(IsStringWhitespace(UString(" a ")));
   EXPECT_EQ(FindNumberInString(UString("Take 12 (3)")), 12);
-  EXPECT_EQ(FindNumberInString(UString("007")), 7);
   EXPECT_EQ(FindNumberInString(UString("none")), -1);
-  EXPECT_EQ(FindNumberInString(UString("x99999999999999999999y")),
-            std::numeric_limits<std::int64_t>::max());
+  EXPECT_EQ(FindNumberInString(UString("x99999999999999999999y")), I64::max());
 }
 
-TEST(UStringFunctions, NumbersToText) {
+TEST(UStringFunctions, NumbersToTextAndBack) {
+  using enum NumFormat;
   UString s;
-  const std::pair<std::int64_t, const char*> thousands[] = {
-      {0, "0"},
-      {999, "999"},
-      {1000, "1,000"},
-      {-1000, "-1,000"},
-      {-999, "-999"},
-      {1234567, "1,234,567"},
-      {std::numeric_limits<std::int64_t>::min(), "-9,223,372,036,854,775,808"}};
-  for (const auto& [n, text] : thousands) {
-    NumToUString(n, NumFormat::kThousands, s);
-    EXPECT_EQ(s, UString(text)) << n;
+  const Rows<std::int64_t, NumFormat, const char*> rows = {
+      {1000, kThousands, "1,000"},
+      {1234567, kThousands, "1,234,567"},
+      {I64::min(), kThousands, "-9,223,372,036,854,775,808"},
+      {-42, kDecimal, "-42"},
+      {255, kHex, "FF"},
+      {-1, kHexPrefixed, "0xFFFFFFFFFFFFFFFF"}};
+  for (const auto& [n, format, text] : rows) {
+    NumToUString(n, format, s);
+    EXPECT_EQ(s, UString(text));
   }
-  EXPECT_EQ(NumToUString(-42), UString("-42"));
-  NumToUString(255, NumFormat::kHex, s);
-  EXPECT_EQ(s, UString("FF"));
-  NumToUString(-1, NumFormat::kHexPrefixed, s);
-  EXPECT_EQ(s, UString("0xFFFFFFFFFFFFFFFF"));
-  EXPECT_EQ(NumToHexUString(0), UString("0"));
   EXPECT_EQ(NumToHexUString(0xABC, 6), UString("000ABC"));
   EXPECT_THROW(NumToUString(1, static_cast<NumFormat>(9), s), TarnError);
-}
 
-TEST(UStringFunctions, NumbersRoundTripInEveryFormat) {
-  std::vector<std::int64_t> values = {0,
-                                      1,
-                                      -1,
-                                      9,
-                                      10,
-                                      999,
-                                      1000,
-                                      -1000,
-                                      65535,
-                                      1LL << 40,
-                                      std::numeric_limits<std::int64_t>::max(),
-                                      std::numeric_limits<std::int64_t>::min()};
   std::uint64_t x = 0x9E3779B97F4A7C15ULL;
-  for (int i = 0; i < 500; ++i) {
+  for (int i = 0; i < 2000; ++i) {
     x ^= x << 13, x ^= x >> 7, x ^= x << 17;
-    values.push_back(static_cast<std::int64_t>(x) >> (i % 60));
+    const std::int64_t v = static_cast<std::int64_t>(x) >> (i % 64);
+    NumToUString(v, static_cast<NumFormat>(i % 4), s);
+    EXPECT_EQ(UStringToNum(s, static_cast<NumFormat>(i % 4)), v) << s;
   }
-  for (NumFormat f :
-       {NumFormat::kDecimal, NumFormat::kThousands, NumFormat::kHex, NumFormat::kHexPrefixed}) {
-    for (std::int64_t v : values) {
-      UString s;
-      NumToUString(v, f, s);
-      EXPECT_EQ(UStringToNum(s, f), v) << s;
-    }
-  }
-  EXPECT_EQ(UStringToNum(UString("  -12,345 apples"), NumFormat::kThousands), -12345);
-  EXPECT_EQ(UStringToNum(UString("12,,3"), NumFormat::kThousands), 12);
-  EXPECT_EQ(UStringToNum(UString("99999999999999999999")),
-            std::numeric_limits<std::int64_t>::max());
-  EXPECT_EQ(UStringToNum(UString("junk")), 0);
+  EXPECT_EQ(UStringToNum(UString("  -12,345 apples"), kThousands), -12345);
+  EXPECT_EQ(UStringToNum(UString("99999999999999999999")), I64::max());
 }
 
+// StrToL is StrToLL saturated to 32 bits; '|' marks where both stop reading.
 TEST(UStringFunctions, StrToLAndStrToLL) {
-  UString rest;
-  EXPECT_EQ(StrToL(UString("  -42abc"), &rest, 10), -42);
-  EXPECT_EQ(rest, UString("abc"));
-  EXPECT_EQ(StrToL(UString("0x1Fz"), &rest, 0), 31);
-  EXPECT_EQ(rest, UString("z"));
-  EXPECT_EQ(StrToL(UString("0x1F"), &rest, 16), 31);
-  EXPECT_EQ(StrToL(UString("010"), &rest, 0), 8);
-  EXPECT_EQ(StrToL(UString("0x"), &rest, 0), 0);
-  EXPECT_EQ(rest, UString("x"));
-  EXPECT_EQ(StrToL(UString("abc"), &rest, 10), 0);
-  EXPECT_EQ(rest, UString("abc"));
-  EXPECT_EQ(StrToL(UString("zz"), nullptr, 36), 1295);
-  EXPECT_EQ(StrToL(UString("2147483647"), nullptr, 10), 2147483647);
-  EXPECT_EQ(StrToL(UString("2147483648"), nullptr, 10), 2147483647);
-  EXPECT_EQ(StrToL(UString("-2147483648"), nullptr, 10), -2147483647 - 1);
-  EXPECT_EQ(StrToL(UString("-2147483649"), nullptr, 10), -2147483647 - 1);
-  EXPECT_EQ(StrToLL(UString("9223372036854775807"), nullptr, 10),
-            std::numeric_limits<std::int64_t>::max());
-  EXPECT_EQ(StrToLL(UString("9223372036854775808"), nullptr, 10),
-            std::numeric_limits<std::int64_t>::max());
-  EXPECT_EQ(StrToLL(UString("-9223372036854775808"), &rest, 10),
-            std::numeric_limits<std::int64_t>::min());
-  EXPECT_TRUE(rest.empty());
-  EXPECT_EQ(StrToLL(UString("+1011"), nullptr, 2), 11);
+  const Rows<std::string, int, std::int64_t> rows = {{"  -42|abc", 10, -42},
+                                                     {"0x1F|z", 0, 31},
+                                                     {"010|", 0, 8},
+                                                     {"0|x", 0, 0},
+                                                     {"|abc", 10, 0},
+                                                     {"zz|", 36, 1295},
+                                                     {"2147483648|", 10, 2147483648LL},
+                                                     {"9223372036854775808|", 10, I64::max()},
+                                                     {"-9223372036854775808|", 10, I64::min()},
+                                                     {"-99999999999999999999|", 10, I64::min()}};
+  for (const auto& [marked, base, value] : rows) {
+    SCOPED_TRACE(marked);
+    const std::size_t stop = marked.find('|');
+    const UString in(marked.substr(0, stop) + marked.substr(stop + 1));
+    const UString rest(marked.substr(stop + 1));
+    UString after, after32;
+    EXPECT_EQ(StrToLL(in, &after, base), value);
+    EXPECT_EQ(StrToL(in, &after32, base), std::clamp<std::int64_t>(value, I32::min(), I32::max()));
+    EXPECT_EQ(after, rest);
+    EXPECT_EQ(after32, rest);
+  }
+  EXPECT_EQ(StrToL(UString("2147483647")), I32::max());
   EXPECT_THROW((void)StrToL(UString("1"), nullptr, 1), TarnError);
   EXPECT_THROW((void)StrToLL(UString("1"), nullptr, 37), TarnError);
 }
 
 TEST(UStringFunctions, StrToDAndDoubleText) {
-  UString rest;
-  EXPECT_EQ(StrToD(UString("3.25xyz"), &rest), 3.25);
-  EXPECT_EQ(rest, UString("xyz"));
-  EXPECT_EQ(StrToD(UString(" -1e3"), &rest), -1000.0);
-  EXPECT_TRUE(rest.empty());
-  EXPECT_EQ(StrToD(UString("+0.5"), nullptr), 0.5);
-  EXPECT_EQ(StrToD(UString("abc"), &rest), 0.0);
-  EXPECT_EQ(rest, UString("abc"));
-  EXPECT_EQ(StrToD(UString("--1"), &rest), 0.0);
-  EXPECT_EQ(rest, UString("--1"));
-  EXPECT_TRUE(std::isinf(StrToD(UString("1e999"), nullptr)));
-  EXPECT_EQ(StrToD(UString("-1e-999"), nullptr), 0.0);
+  const Rows<const char*, double, const char*> rows = {
+      {"3.25xyz", 3.25, "xyz"}, {" -1e3", -1000.0, ""}, {"+0.5", 0.5, ""},
+      {"abc", 0.0, "abc"},      {"--1", 0.0, "--1"},    {"1,5", 1.0, ",5"},
+      {"-1e-999", 0.0, ""},     {"1e999", HUGE_VAL, ""}};
+  for (const auto& [in, value, rest] : rows) {
+    UString after;
+    EXPECT_EQ(StrToD(UString(in), &after), value) << in;
+    EXPECT_EQ(after, UString(rest)) << in;
+  }
   EXPECT_TRUE(std::isnan(UStringToDouble(UString("nan"))));
-  EXPECT_EQ(UStringToDouble(UString("1,5")), 1.0);  // '.' is the only decimal point
 
   UString s;
   DoubleToUString(0.1, s);
   EXPECT_EQ(s, UString("0.1"));
-  DoubleToUString(1.5, s, 2);
-  EXPECT_EQ(s, UString("1.50"));
-  DoubleToUString(-2.0, s, 0);
-  EXPECT_EQ(s, UString("-2"));
+  DoubleToUString(-1.5, s, 2);
+  EXPECT_EQ(s, UString("-1.50"));
   std::uint64_t x = 0x0123456789ABCDEFULL;
   for (int i = 0; i < 2000; ++i) {
     x ^= x << 13, x ^= x >> 7, x ^= x << 17;
-    double d;
-    std::memcpy(&d, &x, sizeof d);
+    const double d = std::bit_cast<double>(x);
     if (!std::isfinite(d)) continue;
     DoubleToUString(d, s);
     EXPECT_EQ(UStringToDouble(s), d) << s;
   }
 }
 
-TEST(UStringFunctions, DatesAndTimesInUTC) {
-  test::SetTimeZone("UTC0");
-  UString s;
-  DateToUString(0, DateTimeFormat::kShort, s);
-  EXPECT_EQ(s, UString("1/1/1904"));
-  DateToUString(0, DateTimeFormat::kLong, s);
-  EXPECT_EQ(s, UString("Friday, January 1, 1904"));
-  TimeToUString(0, DateTimeFormat::kShort, s);
-  EXPECT_EQ(s, UString("00:00"));
+// Each row: the date in the four formats, then the time (kShort drops seconds).
+TEST(UStringFunctions, DatesAndTimesInTheLocalTimeZone) {
   const std::uint32_t t = 3792492429u;  // 2024-03-05 14:07:09 UTC
-  DateToUString(t, DateTimeFormat::kAbbrev, s);
-  EXPECT_EQ(s, UString("Tue, Mar 5, 2024"));
-  DateToUString(t, DateTimeFormat::kLong, s);
-  EXPECT_EQ(s, UString("Tuesday, March 5, 2024"));
-  DateToUString(t, DateTimeFormat::kISO, s);
-  EXPECT_EQ(s, UString("2024-03-05"));
-  TimeToUString(t, DateTimeFormat::kShort, s);
-  EXPECT_EQ(s, UString("14:07"));
-  TimeToUString(t, DateTimeFormat::kLong, s);
-  EXPECT_EQ(s, UString("14:07:09"));
-  DateToUString(0xFFFFFFFFu, DateTimeFormat::kISO, s);
-  EXPECT_EQ(s, UString("2040-02-06"));
-  TimeToUString(0xFFFFFFFFu, DateTimeFormat::kISO, s);
-  EXPECT_EQ(s, UString("06:28:15"));
-  DateToUString(2082844800u + 68169600u, DateTimeFormat::kISO, s);  // 1972-02-29
-  EXPECT_EQ(s, UString("1972-02-29"));
+  const Rows<const char*, std::uint32_t, const char*> rows = {
+      {"UTC0", 0, "1/1/1904|Fri, Jan 1, 1904|Friday, January 1, 1904|1904-01-01|00:00:00"},
+      {"UTC0", t, "3/5/2024|Tue, Mar 5, 2024|Tuesday, March 5, 2024|2024-03-05|14:07:09"},
+      {"UTC0", ~0u, "2/6/2040|Mon, Feb 6, 2040|Monday, February 6, 2040|2040-02-06|06:28:15"},
+      {"UTC0", 2082844800u + 68169600u,
+       "2/29/1972|Tue, Feb 29, 1972|Tuesday, February 29, 1972|1972-02-29|00:00:00"},
+      {"EST5", 0, "12/31/1903|Thu, Dec 31, 1903|Thursday, December 31, 1903|1903-12-31|19:00:00"},
+      {"EST5", t, "3/5/2024|Tue, Mar 5, 2024|Tuesday, March 5, 2024|2024-03-05|09:07:09"}};
+  UString s;
+  for (const auto& [tz, seconds, texts] : rows) {
+    test::SetTimeZone(tz);
+    const std::vector<UString> want = test::Split(texts, '|');
+    for (int f = 0; f < 4; ++f) {
+      DateToUString(seconds, static_cast<DateTimeFormat>(f), s);
+      EXPECT_EQ(s, want[f]) << tz << ' ' << seconds;
+      TimeToUString(seconds, static_cast<DateTimeFormat>(f), s);
+      EXPECT_EQ(s, f == 0 ? want[4].substr(0, 5) : want[4]) << tz << ' ' << seconds;
+    }
+  }
+  test::SetTimeZone("UTC0");
   EXPECT_THROW(DateToUString(0, static_cast<DateTimeFormat>(7), s), TarnError);
 }
 
-TEST(UStringFunctions, DatesFollowTheLocalTimeZone) {
-  test::SetTimeZone("EST5");
-  UString s;
-  const std::uint32_t t = 3792492429u;  // 2024-03-05 14:07:09 UTC
-  TimeToUString(t, DateTimeFormat::kLong, s);
-  EXPECT_EQ(s, UString("09:07:09"));
-  DateToUString(0, DateTimeFormat::kISO, s);
-  EXPECT_EQ(s, UString("1903-12-31"));
-  TimeToUString(0, DateTimeFormat::kShort, s);
-  EXPECT_EQ(s, UString("19:00"));
-  test::SetTimeZone("UTC0");
-}
-
-TEST(UStringFunctions, NormalizeFormKC) {
+TEST(UStringFunctions, NormalizeFormKCFourCharCodesAndRawData) {
   EXPECT_EQ(NormalizeStringWithFormKC(U("\uFB01le")), UString("file"));
   EXPECT_EQ(NormalizeStringWithFormKC(U("e\u0301")), U("\u00E9"));
-  EXPECT_EQ(NormalizeStringWithFormKC(U("\u2460\uFF21")), UString("1A"));
-  EXPECT_EQ(NormalizeStringWithFormKC(UString()), UString());
-}
-
-TEST(UStringFunctions, FourCharCodes) {
   UString s;
-  ResTypeToUString(0x57415645, s);  // 'WAVE'
-  EXPECT_EQ(s, UString("WAVE"));
-  EXPECT_EQ(UStringToResType(s), 0x57415645u);
   ResTypeToUString(0x8EA52020, s);
-  EXPECT_EQ(Units(s.begin(), s.end()), (Units{0xE9, 0x2022, ' ', ' '}));
+  EXPECT_EQ(test::UnitsOf(s), (Units{0xE9, 0x2022, ' ', ' '}));
   EXPECT_EQ(UStringToResType(UString("ab")), 0x61622020u);
   EXPECT_EQ(UStringToResType(U("\u4E01xyz!")), 0x0178797Au);  // no Mac Roman form: low byte
-  // Every Mac Roman byte in every position survives the round trip.
   for (unsigned b = 0; b < 256; ++b) {
     const std::uint32_t code =
         (b << 24) | ((255 - b) << 16) | (((b + 85) & 0xFF) << 8) | (b ^ 0x5A);
     ResTypeToUString(code, s);
-    ASSERT_EQ(s.length(), 4u);
     EXPECT_EQ(UStringToResType(s), code) << std::hex << code;
   }
+  std::string buf(6, '\xEE');  // raw data: low bytes, then zeros
+  auto* p = reinterpret_cast<unsigned char*>(buf.data());
+  EXPECT_EQ(UStringToRawData(U("AB\u0141"), p, 5), 3u);
+  EXPECT_EQ(buf, std::string("AB\x41\0\0\xEE", 6));
+  EXPECT_EQ(UStringToRawData(UString("abcdefgh"), p, 4), 4u);
+  EXPECT_EQ(buf, std::string("abcd\0\xEE", 6));
 }
 
-TEST(UStringFunctions, RawData) {
-  unsigned char buf[6];
-  std::memset(buf, 0xEE, sizeof buf);
-  EXPECT_EQ(UStringToRawData(U("AB\u0141"), buf, sizeof buf), 3u);
-  EXPECT_EQ(std::string(reinterpret_cast<char*>(buf), 6), std::string("AB\x41\0\0\0", 6));
-  std::memset(buf, 0xEE, sizeof buf);
-  EXPECT_EQ(UStringToRawData(UString("abcdefgh"), buf, 4), 4u);
-  EXPECT_EQ(buf[3], 'd');
-  EXPECT_EQ(buf[4], 0xEE);
-}
-
-TEST(UStringFunctions, StrncatTruncateFirst) {
-  auto cat = [](const char* a, const char* b, short max) {
-    UString first(a);
-    UStrncatTruncateFirst(first, UString(b), max);
-    return first;
-  };
-  EXPECT_EQ(cat("Hello", "World", 8), UString("HelWorld"));
-  EXPECT_EQ(cat("Hello", "World", 3), UString("Wor"));
-  EXPECT_EQ(cat("Hello", "World", 10), UString("HelloWorld"));
-  EXPECT_EQ(cat("Hello", "World", 12), UString("HelloWorld"));
-  EXPECT_EQ(cat("Hello", "World", -4), UString());
-  const UString first("Hello"), second("World");
-  for (short max = 0; max <= 12; ++max) {
-    const std::size_t keepFirst = max > 5 ? std::min<std::size_t>(5, max - 5) : 0;
-    const std::size_t keepSecond = std::min<std::size_t>(5, max);
-    EXPECT_EQ(cat("Hello", "World", max), first.substr(0, keepFirst) + second.substr(0, keepSecond))
-        << max;
+// The end of the first text gives way first, then the end of the second.
+TEST(UStringFunctions, StrncatTruncateFirstOverAGrid) {
+  const UString full("abcdefg"), other("1234567");
+  for (std::size_t n1 = 0; n1 <= 6; ++n1) {
+    for (std::size_t n2 = 0; n2 <= 6; ++n2) {
+      for (short max = -3; max <= 14; ++max) {
+        const std::size_t room = static_cast<std::size_t>(std::max<short>(max, 0));
+        const std::size_t keep2 = std::min(n2, room), keep1 = std::min(n1, room - keep2);
+        UString first = full.substr(0, n1);
+        UStrncatTruncateFirst(first, other.substr(0, n2), max);
+        ASSERT_EQ(first, full.substr(0, keep1) + other.substr(0, keep2))
+            << n1 << ' ' << n2 << ' ' << max;
+      }
+    }
   }
-}
-
-TEST(UStringFunctions, EncodingQueries) {
-  EXPECT_TRUE(IsSystemOrRomanEncoding(0));
-  EXPECT_TRUE(IsSystemOrRomanEncoding(1));
-  EXPECT_TRUE(IsSystemOrRomanEncoding(999));
-  EXPECT_FALSE(IsSystemOrRomanEncoding(2) || IsSystemOrRomanEncoding(3) ||
-               IsSystemOrRomanEncoding(4));
 }
 
 }  // namespace
