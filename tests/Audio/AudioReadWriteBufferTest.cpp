@@ -2,138 +2,66 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
-#include <numeric>
-#include <vector>
-
-#include "tarn/Errors/TarnError.h"
+#include "AudioTestUtil.h"
 
 namespace tarn {
 namespace {
 
-// A two-channel block whose channel c sample i is c * 10000 + start + i.
-std::shared_ptr<AudioReadWriteBuffer> Ramp(std::int64_t start, int length) {
-  auto block = std::make_shared<AudioReadWriteBuffer>(2, length);
-  for (int c = 0; c < 2; ++c)
-    for (int i = 0; i < length; ++i) (*block)[c][i] = float(c * 10000 + start + i);
-  return block;
-}
-
-TEST(AudioReadWriteBuffer, OwningBlocksAreZeroedAndSilent) {
+TEST(AudioReadWriteBuffer, OwnedBorrowedAndHostBlocks) {
   AudioReadWriteBuffer block(12, 64);
-  EXPECT_TRUE(block.IsSilent());
-  EXPECT_TRUE(block.OwnsData());
-  EXPECT_EQ(block.GetNumChans(), 12);
-  for (int c = 0; c < 12; ++c)
-    for (int i = 0; i < 64; ++i) ASSERT_EQ(block[c][i], 0.0f);
-  block.SetIsSilent(false);
-  EXPECT_FALSE(block.IsSilent());
-  AudioReadWriteBuffer three(3, 8);
-  EXPECT_EQ(three[3], nullptr);
-  EXPECT_EQ(three[11], nullptr);
-}
+  EXPECT_TRUE(block.IsSilent() && block.OwnsData());
+  for (int c = 0; c < 12; ++c) EXPECT_EQ(std::count(block[c], block[c] + 64, 0.0f), 64);
+  EXPECT_EQ(AudioReadWriteBuffer(3, 8)[3], nullptr);
+  for (auto [channels, length] : {std::pair{13, 10}, {-1, 10}, {2, -1}})
+    EXPECT_EQ(ErrorOf([&] { AudioReadWriteBuffer(channels, length); }), -50) << channels;
 
-TEST(AudioReadWriteBuffer, BadShapesAreRefused) {
-  for (auto [channels, length] : {std::pair{13, 10}, {-1, 10}, {2, -1}}) {
-    try {
-      AudioReadWriteBuffer block(channels, length);
-      ADD_FAILURE() << channels << " x " << length;
-    } catch (const TarnError& e) {
-      EXPECT_TRUE(e.IsMacOSError(-50));
-    }
-  }
-}
-
-TEST(AudioReadWriteBuffer, BorrowsFromCallersAndHosts) {
   std::vector<float> left(32, 1.0f), right(32, 2.0f);
   float* arrays[] = {left.data(), right.data()};
   AudioReadWriteBuffer borrowed(2, 32, false, arrays);
-  EXPECT_FALSE(borrowed.OwnsData());
-  EXPECT_EQ(borrowed[1], right.data());
-
-  PavRenderCacheBuffer host;
-  host.length = 32;
-  host.channelCount = 2;
-  host.hasData = true;
-  host.flags = 1;
-  host.channels[0] = left.data();
-  host.channels[1] = right.data();
+  EXPECT_TRUE(!borrowed.OwnsData() && borrowed[1] == right.data());
+  PavRenderCacheBuffer host{32, 1, 2, true, {left.data(), right.data()}};
   AudioReadWriteBuffer fromHost(host);
-  EXPECT_EQ(fromHost[0], left.data());
-  EXPECT_TRUE(fromHost.IsSilent());
-  EXPECT_FALSE(fromHost.OwnsData());
+  EXPECT_TRUE(fromHost[0] == left.data() && fromHost.IsSilent() && !fromHost.OwnsData());
   host.flags = 2;  // only bit 0 means silence
   EXPECT_FALSE(AudioReadWriteBuffer(host).IsSilent());
-
   host.hasData = false;
   AudioReadWriteBuffer own(host);
-  EXPECT_TRUE(own.OwnsData());
-  EXPECT_TRUE(own.IsSilent());
-  EXPECT_NE(own[0], left.data());
-  EXPECT_EQ(own[1][31], 0.0f);
-  EXPECT_EQ(own.GetDataLen(), 32);
+  EXPECT_TRUE(own.OwnsData() && own.IsSilent());
+  EXPECT_TRUE(own[0] != left.data() && own[1][31] == 0.0f);
 }
 
-TEST(AudioReadWriteBufferCache, EmptyCacheSentinels) {
+// Blocks [0, 100) and [100, 200), channel c sample t holding c * 10000 + t.
+TEST(AudioReadWriteBufferCache, ReadsAcrossBlocksAndFlushes) {
   AudioReadWriteBufferCache cache;
-  EXPECT_EQ(cache.getStart(), SampleCount(281474976710655LL));
-  EXPECT_EQ(cache.getEnd(), SampleCount(-281474976710655LL));
-  EXPECT_GT(cache.getStart(), cache.getEnd());
-  float out[4] = {};
-  EXPECT_EQ(cache.readChannelData(out, 0, 0, 4), 0);
-}
-
-TEST(AudioReadWriteBufferCache, ReadsAcrossBlocks) {
-  AudioReadWriteBufferCache cache;
-  cache.addData(100, Ramp(100, 100));
-  cache.addData(0, Ramp(0, 100));  // inserted in order
-  EXPECT_EQ(cache.getStart(), SampleCount(0));
-  EXPECT_EQ(cache.getEnd(), SampleCount(200));
+  EXPECT_TRUE(cache.getStart() == 281474976710655LL && cache.getEnd() == -281474976710655LL);
   std::vector<float> out(400, -1.0f);
-  ASSERT_EQ(cache.readChannelData(out.data(), 1, 50, 150), 150);
-  for (int i = 0; i < 150; ++i) ASSERT_EQ(out[i], float(10000 + 50 + i)) << i;
-  EXPECT_EQ(out[150], -1.0f);
-  // Every start and count over the cache against the ramp.
-  for (int start = -20; start <= 210; start += 7) {
-    for (int count : {0, 1, 99, 100, 101, 250}) {
-      std::fill(out.begin(), out.end(), -1.0f);
-      const int from = std::max(start, 0);  // before the first block reads from its start
-      const int expected = std::max(0, std::min(count, 200 - from));
-      ASSERT_EQ(cache.readChannelData(out.data(), 0, start, count), expected)
-          << start << " " << count;
-      for (int i = 0; i < expected; ++i) ASSERT_EQ(out[i], float(from + i));
-      ASSERT_EQ(out[expected], -1.0f);
-    }
+  EXPECT_EQ(cache.readChannelData(out.data(), 0, 0, 4), 0);
+  std::shared_ptr<AudioReadWriteBuffer> blocks[2];
+  for (int b : {1, 0}) {  // inserted in order
+    blocks[b] = std::make_shared<AudioReadWriteBuffer>(2, 100);
+    for (int c = 0; c < 2; ++c)
+      for (int i = 0; i < 100; ++i) (*blocks[b])[c][i] = float(c * 10000 + b * 100 + i);
+    cache.addData(b * 100, blocks[b]);
   }
-}
-
-TEST(AudioReadWriteBufferCache, FlushReleasesOnlyFinishedBlocks) {
-  AudioReadWriteBufferCache cache;
-  auto first = Ramp(0, 100);
-  cache.addData(0, first);
-  cache.addData(100, Ramp(100, 100));
-  cache.flushUpTo(99);
-  EXPECT_EQ(cache.size(), 2u);
-  EXPECT_EQ(first.use_count(), 2);
-  cache.flushUpTo(100);
-  EXPECT_EQ(cache.size(), 1u);
-  EXPECT_EQ(first.use_count(), 1);  // the cache let go of its share
-  EXPECT_EQ(cache.getStart(), SampleCount(100));
-  cache.flushUpTo(1000);
-  EXPECT_EQ(cache.size(), 0u);
-}
-
-TEST(AudioReadWriteBufferCache, ChannelsABlockLacksAreRefused) {
-  AudioReadWriteBufferCache cache;
-  cache.addData(0, Ramp(0, 10));
-  float out[10];
-  for (int channel : {-1, 2, 12}) {
-    try {
-      (void)cache.readChannelData(out, channel, 0, 10);
-      ADD_FAILURE() << channel;
-    } catch (const TarnError& e) {
-      EXPECT_TRUE(e.IsMacOSError(-50));
-    }
+  EXPECT_TRUE(cache.getStart() == 0 && cache.getEnd() == 200);
+  for (int start = -20; start <= 210; start += 7)
+    for (int count : {0, 1, 99, 100, 101, 250})
+      for (int channel : {0, 1}) {
+        std::fill(out.begin(), out.end(), -1.0f);
+        const int from = std::max(start, 0);  // before the first block reads from its start
+        const int expected = std::max(0, std::min(count, 200 - from));
+        ASSERT_EQ(cache.readChannelData(out.data(), channel, start, count), expected)
+            << start << " " << count;
+        for (int i = 0; i < expected; ++i) ASSERT_EQ(out[i], float(channel * 10000 + from + i));
+        ASSERT_EQ(out[expected], -1.0f);
+      }
+  for (int channel : {-1, 2, 12})
+    EXPECT_EQ(ErrorOf([&] { (void)cache.readChannelData(out.data(), channel, 0, 10); }), -50);
+  // Flushing releases only finished blocks, and the cache's share of them.
+  for (auto [upTo, size, start] : {std::tuple{99, 2u, 0}, {100, 1u, 100}, {1000, 0u, -1}}) {
+    cache.flushUpTo(upTo);
+    EXPECT_EQ(blocks[0].use_count(), upTo < 100 ? 2 : 1);
+    EXPECT_TRUE(cache.size() == size && (start < 0 || cache.getStart() == start)) << upTo;
   }
 }
 
