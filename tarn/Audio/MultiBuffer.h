@@ -62,7 +62,8 @@ class MultiBuffer : public Invariable<MultiBuffer> {
 
   // The start time a PopBuffer would leave.
   [[nodiscard]] SampleCount StartTimeAfterPop() const noexcept;
-  // The k-th filled block, or the one whose span holds t; null when none.
+  // The k-th filled block, or block (t - start) / 32768 (the grid slot of t,
+  // even past a truncated end); null when there is no such filled block.
   [[nodiscard]] SampleBuffer* GetInUseBuffer(int k) const noexcept;
   [[nodiscard]] SampleBuffer* GetInUseBuffer(SampleCount t) const noexcept;
 
