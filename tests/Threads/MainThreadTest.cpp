@@ -4,9 +4,11 @@
 
 #include <atomic>
 #include <chrono>
+#include <numeric>
 #include <thread>
 #include <vector>
 
+#include "ThreadsTestUtil.h"
 #include "tarn/Basics/TarnCoreLibCallbacks.h"
 #include "tarn/Threads/CIdleChore.h"
 
@@ -23,71 +25,52 @@ class CountingCallbacks : public TarnCoreLibCallbacks {
   std::atomic<int> requests{0};
 };
 
+// Counts its runs; may throw, or assign itself again from inside.
 class CountingChore : public CIdleChore {
  public:
   ~CountingChore() override { Cancel(); }
-  int runs = 0;
-  int rescheduleTimes = 0;
+  int runs = 0, rescheduleTimes = 0;
+  bool fail = false;
 
  protected:
   void Action() override {
     ++runs;
-    if (rescheduleTimes > 0) {
-      --rescheduleTimes;
-      Assign();
-    }
+    if (rescheduleTimes-- > 0) Assign();
+    if (fail) throw TarnError("K", "S", "Sub", 7, "chore failed");
   }
 };
 
-TEST(CIdleChore, AssignSchedulesOnceAndCancelUnschedules) {
+TEST(CIdleChore, AssignOnceCancelAndReassignFromInside) {
   CountingCallbacks callbacks;
   TarnCoreLibCallbacks::SetCallbackAPI(&callbacks);
   RunIdleChores();  // this test's thread is the main thread from here on
-  CountingChore chore;
-  EXPECT_FALSE(chore.IsScheduled());
-  chore.Assign();
-  chore.Assign();
-  EXPECT_TRUE(chore.IsScheduled());
+  CountingChore a, b;
+  a.Assign();
+  a.Assign();
   EXPECT_EQ(callbacks.requests.load(), 1);
   EXPECT_EQ(RunIdleChores(), 1);
-  EXPECT_EQ(chore.runs, 1);
   EXPECT_EQ(RunIdleChores(), 0);
-
-  chore.Assign();
-  chore.Cancel();
-  EXPECT_FALSE(chore.IsScheduled());
+  a.Assign();
+  a.Cancel();
+  EXPECT_FALSE(a.IsScheduled());
   EXPECT_EQ(RunIdleChores(), 0);
-  EXPECT_EQ(chore.runs, 1);
   TarnCoreLibCallbacks::SetCallbackAPI(nullptr);
-}
-
-TEST(CIdleChore, RescheduledFromInsideRunsOnTheNextPass) {
-  CountingChore a, b;
   a.rescheduleTimes = 2;
   a.Assign();
   b.Assign();
   EXPECT_EQ(RunIdleChores(), 2);  // a, b; a's new run waits
-  EXPECT_EQ(a.runs, 1);
-  EXPECT_EQ(b.runs, 1);
   EXPECT_TRUE(a.IsScheduled());
   EXPECT_EQ(RunIdleChores(), 1);
   EXPECT_EQ(RunIdleChores(), 1);
   EXPECT_EQ(RunIdleChores(), 0);
-  EXPECT_EQ(a.runs, 3);
+  EXPECT_EQ(a.runs, 4);
+  EXPECT_EQ(b.runs, 1);
 }
 
-class ThrowingChore : public CIdleChore {
- public:
-  ~ThrowingChore() override { Cancel(); }
-
- protected:
-  void Action() override { throw TarnError("K", "S", "Sub", 7, "chore failed"); }
-};
-
-TEST(CIdleChore, ErrorInAChoreIsPrintedAndThePumpCarriesOn) {
+TEST(CIdleChore, ErrorIsPrintedAndOnlyTheMainThreadMayPump) {
   RunIdleChores();
-  ThrowingChore bad;
-  CountingChore good;
+  CountingChore bad, good;
+  bad.fail = true;
   bad.Assign();
   good.Assign();
   testing::internal::CaptureStderr();
@@ -95,20 +78,9 @@ TEST(CIdleChore, ErrorInAChoreIsPrintedAndThePumpCarriesOn) {
   EXPECT_EQ(testing::internal::GetCapturedStderr(),
             "Unhandled exception: K S Sub 7 chore failed\n");
   EXPECT_EQ(good.runs, 1);
-}
-
-TEST(CIdleChore, OnlyTheMainThreadMayPump) {
-  RunIdleChores();
-  std::atomic<int> code{0};
-  std::thread other([&] {
-    try {
-      RunIdleChores();
-    } catch (const TarnError& e) {
-      code = e.GetIntErrorCode();
-    }
-  });
-  other.join();
-  EXPECT_EQ(code.load(), -50);
+  std::thread([] {
+    EXPECT_EQ(test::CatchError([] { RunIdleChores(); }).GetIntErrorCode(), -50);
+  }).join();
 }
 
 TEST(CIdleChore, AssignFromAnotherThreadWakesThePump) {
@@ -117,53 +89,45 @@ TEST(CIdleChore, AssignFromAnotherThreadWakesThePump) {
     std::this_thread::sleep_for(5ms);
     chore.Assign();
   });
-  // Returns after the whole duration, having run the chore once.
   EXPECT_EQ(PumpMainThreadFor(100ms), 1);
   other.join();
   EXPECT_EQ(chore.runs, 1);
 }
 
-TEST(TarnMainThread, JobsRunOnTheMainThreadInOrder) {
+// Jobs posted by this thread run in order; worker threads wait for results.
+TEST(TarnMainThread, JobsRunOnTheMainThread) {
   RunIdleChores();
   TarnMainThread& feeder = TarnMainThread::Instance();
-  EXPECT_EQ(&feeder, &TarnMainThread::Instance());
   EXPECT_FALSE(feeder.IsCurrent());
   std::vector<int> order;
   std::atomic<bool> onMain{true};
-  std::vector<std::shared_ptr<TarnPromise<void>>> promises;
+  std::shared_ptr<TarnPromise<void>> last;
   for (int i = 0; i < 150; ++i) {
-    promises.push_back(feeder.Post([&, i] {
+    last = feeder.Post([&, i] {
       order.push_back(i);
-      if (!IsMainThread()) onMain = false;
-    }));
-  }
-  for (int spins = 0; spins < 1000 && !promises.back()->IsDone(); ++spins) PumpMainThreadFor(10ms);
-  ASSERT_TRUE(promises.back()->IsDone());
-  EXPECT_TRUE(onMain.load());
-  ASSERT_EQ(order.size(), 150u);
-  for (int i = 0; i < 150; ++i) EXPECT_EQ(order[static_cast<size_t>(i)], i);
-}
-
-TEST(TarnMainThread, WorkerThreadsWaitForMainThreadResults) {
-  RunIdleChores();
-  std::atomic<int> sum{0};
-  std::atomic<int> finished{0};
-  std::vector<std::thread> workers;
-  for (int w = 0; w < 3; ++w) {
-    workers.emplace_back([&, w] {
-      for (int i = 0; i < 20; ++i)
-        sum += TarnMainThread::Instance().Post([=] { return w + i; })->Get();
-      finished++;
+      onMain = onMain && IsMainThread();
     });
   }
-  for (int spins = 0; spins < 2000 && finished.load() < 3; ++spins) PumpMainThreadFor(5ms);
-  for (auto& t : workers) t.join();
+  std::atomic<int> sum{0}, finished{0};
+  std::thread workers([&] {
+    test::RunThreads(3, [&](int w) {
+      for (int i = 0; i < 20; ++i) sum += feeder.Post([=] { return w + i; })->Get();
+    });
+    finished = 1;
+  });
+  for (int spins = 0; spins < 2000 && !(finished && last->IsDone()); ++spins)
+    PumpMainThreadFor(5ms);
+  workers.join();
   EXPECT_EQ(sum.load(), 3 * 190 + 20 * (0 + 1 + 2));
+  EXPECT_TRUE(onMain.load());
+  std::vector<int> expected(150);
+  std::iota(expected.begin(), expected.end(), 0);
+  EXPECT_EQ(order, expected);
 }
 
 TEST(TarnMainThread, InterruptStatusNamesMainAndInterruptThreads) {
   std::atomic<uint32_t> workerID{0};
-  std::atomic<bool> recorded{false}, inWorker{false}, inOther{true};
+  std::atomic<bool> recorded{false}, inWorker{false};
   std::thread worker([&] {
     workerID = TarnThreadID::CurrentThreadRawID();
     while (!recorded.load()) std::this_thread::yield();
@@ -173,10 +137,8 @@ TEST(TarnMainThread, InterruptStatusNamesMainAndInterruptThreads) {
   InitInterruptStatus(TarnThreadID(workerID.load()));
   recorded = true;
   EXPECT_TRUE(InMainThreadOrWorkerThread());
-  std::thread other([&] { inOther = InMainThreadOrWorkerThread(); });
-  other.join();
+  EXPECT_FALSE(test::OnOtherThread([] { return InMainThreadOrWorkerThread(); }));
   worker.join();
-  EXPECT_FALSE(inOther.load());
   EXPECT_TRUE(inWorker.load());
 }
 
