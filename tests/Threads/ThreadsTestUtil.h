@@ -1,10 +1,14 @@
-// Small helpers shared by the thread tests.
+// Small helpers, and the headers, shared by the thread tests.
 #pragma once
 
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <chrono>
+#include <cstdint>
 #include <functional>
+#include <memory>
+#include <numeric>
 #include <thread>
 #include <vector>
 
