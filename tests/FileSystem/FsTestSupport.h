@@ -5,9 +5,11 @@
 #include <gtest/gtest.h>
 
 #include <filesystem>
+#include <fstream>
 #include <random>
 #include <string>
 
+#include "tarn/Errors/TarnError.h"
 #include "tarn/FileSystem/FileSpecification.h"
 #include "tarn/String/UString.h"
 
@@ -15,9 +17,7 @@ namespace tarntest {
 
 // From UTF-8 text (u8"..." literals included).
 inline tarn::UString U(const char* utf8) { return tarn::UString(utf8); }
-inline tarn::UString U(const char8_t* utf8) {
-  return tarn::UString(reinterpret_cast<const char*>(utf8));
-}
+inline tarn::UString U(const char8_t* utf8) { return U(reinterpret_cast<const char*>(utf8)); }
 
 inline tarn::UString ToU(const std::filesystem::path& p) {
   const std::u8string s = p.u8string();
@@ -35,14 +35,24 @@ int ExistsCode();
 int NotFoundCode();
 int RenameExistsCode();  // renaming onto an existing name
 
+// Checks that `f` throws a TarnError of `kind` with `code` and `attachment`.
+template <class F>
+void ExpectError(F&& f, const char* kind, int code, const tarn::UString& attachment) {
+  try {
+    f();
+    ADD_FAILURE() << "no throw";
+  } catch (const tarn::TarnError& e) {
+    EXPECT_EQ(e.GetKind(), kind);
+    EXPECT_EQ(e.GetIntErrorCode(), code);
+    EXPECT_EQ(e.GetAttachment().value_or(tarn::UString()), attachment);
+  }
+}
+
 class TempFolderTest : public ::testing::Test {
  protected:
   void SetUp() override {
-    std::random_device rd;
-    dir_ =
-        std::filesystem::temp_directory_path() /
-        ("tarn_fs_" + std::string(::testing::UnitTest::GetInstance()->current_test_info()->name()) +
-         "_" + std::to_string(rd()));
+    dir_ = std::filesystem::temp_directory_path() /
+           ("tarn_fs_" + std::to_string(std::random_device{}()));
     std::filesystem::create_directories(dir_);
     folder_ = tarn::FileSpecification(ToU(dir_));
   }
@@ -54,19 +64,9 @@ class TempFolderTest : public ::testing::Test {
   tarn::FileSpecification In(const tarn::UString& name) const {
     return tarn::FileSpecification(folder_, name);
   }
-  void MakeFile(const tarn::UString& name, const std::string& content = "") const {
-    std::FILE* f = std::fopen(ToPath(In(name).GetFullPath()).string().c_str(), "wb");
-    ASSERT_NE(f, nullptr);
-    std::fwrite(content.data(), 1, content.size(), f);
-    std::fclose(f);
-  }
+  void MakeFile(const tarn::UString& name) const { std::ofstream{ToPath(In(name).GetFullPath())}; }
   void MakeFolder(const tarn::UString& name) const {
     std::filesystem::create_directory(ToPath(In(name).GetFullPath()));
-  }
-  std::size_t CountEntries() const {
-    std::size_t n = 0;
-    for ([[maybe_unused]] auto& e : std::filesystem::directory_iterator(dir_)) ++n;
-    return n;
   }
 
   std::filesystem::path dir_;

@@ -1,0 +1,322 @@
+// Streams: the wire format with exact bytes, the reading rules, chunks and
+// length blocks; a record through every kind of stream, cut at every byte,
+// piped between threads; and what is particular to files, handles, memory.
+
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <thread>
+#include <utility>
+
+#include "StreamTestSupport.h"
+#include "tarn/FileSystem/File.h"
+#include "tarn/Streams/LengthIO.h"
+#include "tarn/Streams/StreamChunk.h"
+#include "tarn/Streams/UStringIO.h"
+
+namespace tarn {
+namespace {
+
+using test::Bytes;
+using test::CodeOf;
+using test::Hex;
+
+constexpr int kPrefs = 0x50524546;  // 'PREF'
+
+void PutRecord(CStream& s) {
+  for (const test::Field& f : test::Record()) test::Run(s, f, false);
+}
+void CheckRecord(CStream& s) {
+  for (const test::Field& f : test::Record()) EXPECT_EQ(test::Run(s, f, true), 0) << f.name;
+}
+// The error code of reading a record that `s` holds only part of.
+int CodeReadingRecord(CStream& s) {
+  return CodeOf([&] {
+    for (const test::Field& f : test::Record()) (void)test::Run(s, f, true);
+  });
+}
+
+TEST(CStreamEncoding, ExactBytes) {
+  for (const test::Field& f : test::Record())
+    EXPECT_EQ(test::ImageOf([&](CStream& s) { test::Run(s, f, false); }), Hex(f.hex)) << f.name;
+  auto_handle<char> xyz(NewHandle(3));
+  std::memcpy(xyz.data(), "xyz", 3);
+  EXPECT_EQ(CodeOf([&] { test::ImageOf([&](CStream& s) { s.PutHandleOfSize(xyz.get(), 4); }); }),
+            -50);
+  const UString cafe = test::WithChar("caf", 0xE9);  // in the ANSI code page
+  EXPECT_EQ(test::ImageOf([&](CStream& s) {
+              s.PutStr("ab");
+              s.PutStr255AsLine(reinterpret_cast<const unsigned char*>("\3abcX"));
+              s.PutHandleOfSize(xyz.get(), 2);
+              PutUStringAsCharArray(s, cafe);
+              PutUStringAsStr(s, test::WithChar("a", 0x2603));  // not in it
+              PutUStringAsStr255(s, cafe);
+              PutUStringAsFixedSizeUCharArray(s, 4, cafe);
+              PutUStringAsFixedSizeUCharArray(s, 8, cafe);
+            }),
+            Hex("616200 03616263 0D 7879 636166E9 613F00 04636166E9 02636100 "
+                "04636166E9000000"));
+  EXPECT_EQ(test::ImageOf([](CStream& s) {
+              LengthWriter(s, false).PatchWithNum(-2);
+              LengthWriter len(s, false);
+              s.PutCharArray("0123", 4);
+              len.PatchLength();
+              s.PutChar('!');
+              LengthWriter own(s, true);
+              { StreamChunkWriter w(s, kPrefs, StreamChunkVers(2, 3)); }
+              StreamChunkWriter w(s, kPrefs);  // the named default version, 1.1
+              s.PutShort(2);
+              StreamChunkVers(-1, 258).put(s);
+            }),
+            Hex("FFFFFFFE 00000004 30313233 21 0000002A 7C970F1A 50524546 0002 0003 00000000 "
+                "7C970F1A 50524546 0001 0001 00000006 0002 FFFF 0102"));
+}
+
+TEST(CStreamReading, Failures) {
+  UString u("x");
+  unsigned char buf[256];
+  test::TempPath missing("missing");
+  const auto missingFile = [&] { return CFileStream(missing.Spec()); };
+  const struct {
+    const char* name;
+    Bytes input;
+    test::Action read;
+    int code;
+  } rows[] = {
+      {"text count past the data", Hex("00000005 6162"), [&](CStream& s) { s.GetUString(u); }, -39},
+      {"handle past the data", Hex("7FFFFFFF 0102"), [](CStream& s) { (void)s.GetHandle(); }, -39},
+      {"negative handle count", Hex("FFFFFFFE"), [](CStream& s) { (void)s.GetHandle(); }, -50},
+      {"no number text", {}, [](CStream& s) { (void)s._GetDouble(); }, CStream::kNoNumberText},
+      {"any non-zero byte is true", Hex("02"), [](CStream& s) { EXPECT_TRUE(s.GetBoolean()); }, 0},
+      {"negative text count", Hex("FFFFFFFF"), [&](CStream& s) { s.GetUString(u); }, 0},
+      {"number text, no NUL", test::Text("12."), [](CStream& s) { (void)s._GetDouble(); }, -39},
+      {"line too long", test::Text(std::string(300, 'q') + "\r"),
+       [&](CStream& s) { s.GetLineAsStr255(buf); }, CStream::kLineTooLong},
+      {"move past the end", Hex("0102"), [](CStream& s) { s.MoveTo(3); }, 6},
+      {"chunk without magic", Hex("7C970F1B 00000000 00000000 00000000"),
+       [](CStream& s) { StreamChunkReader r(s); }, 103},
+      {"length including itself below 4", Hex("00000002 61626364"),
+       [](CStream& s) { LengthReader len(s, true); }, 6},
+      {"length past the data", Hex("00000009 61626364"),
+       [](CStream& s) { LengthReader(s, false).SkipRemainingData(); }, 6},
+      {"closed handle stream", {}, [](CStream&) { CHandleStream().PutLong(1); }, -38},
+      {"closed file stream", {}, [&](CStream&) { (void)missingFile().GetLong(); }, -38},
+      {"missing file", {}, [&](CStream&) { missingFile().Open(kTCLReadWriteMode); }, -5000},
+  };
+  for (const auto& row : rows) {
+    test::Reader s(row.input);
+    EXPECT_EQ(CodeOf([&] { row.read(s); }), row.code) << row.name;
+  }
+  EXPECT_TRUE(u.empty()) << "a negative count reads as empty";
+}
+
+// Against a chunk of version 2.3: too old when the reader's major is above 2,
+// too new when the reader's version is below 2.3.
+TEST(StreamChunk, VersionDecisionsOverAGrid) {
+  test::Reader s(Hex("7C970F1A 50524546 0002 0003 00000000"));
+  StreamChunkReader r(s);
+  EXPECT_EQ(r.GetVers(), StreamChunkVers(2, 3));
+  for (short major = 1; major <= 3; ++major) {
+    for (short minor = 0; minor <= 9; ++minor) {
+      SCOPED_TRACE(testing::Message() << major << "." << minor);
+      const StreamChunkVers v(major, minor);
+      const bool tooOld = major > 2;
+      const bool tooNew = std::pair(major, minor) < std::pair<short, short>(2, 3);
+      EXPECT_EQ(v < StreamChunkVers(2, 3), tooNew);
+      EXPECT_EQ(std::pair(r.IsTooOld(v), r.IsTooNew(v)), std::pair(tooOld, tooNew));
+      bool old = !tooOld, young = !tooNew;
+      r.GetAge(v, old, young);
+      EXPECT_EQ(std::pair(old, young), std::pair(tooOld, tooNew));
+      EXPECT_EQ(r.ShouldRead(v), !tooOld && !tooNew);
+      const int code = tooOld ? -1001 : tooNew ? -1002 : 0;
+      EXPECT_EQ(CodeOf([&] { r.FailIfCantRead(v, -1001, -1002); }), code);
+    }
+  }
+}
+
+// A newer writer adds a nested chunk, a length block and trailing fields; an
+// old reader that reads only the first field still lands on the next record.
+TEST(StreamChunk, UnreadDataAndNestedChunksAreSkipped) {
+  CHandleStream s(kTCLReadWriteMode);
+  for (int record = 0; record < 3; ++record) {
+    StreamChunkWriter outer(s, kPrefs, StreamChunkVers(1, 4));
+    s.PutLong(record);
+    {
+      StreamChunkWriter inner(s, kPrefs, StreamChunkVers(7, 0));
+      s.PutUString(UString("inner text"));
+    }
+    LengthWriter len(s, true);
+    s.PutLong(1);
+    s.PutIEEEDouble(0.5);
+  }
+  s.PutLong(-7);
+  s.MoveTo(0);
+  for (int record = 0; record < 3; ++record) {
+    ASSERT_TRUE(StreamChunkReader::HasMagic(s));
+    StreamChunkReader outer(s);
+    EXPECT_EQ(s.GetLong(), record);
+  }
+  EXPECT_FALSE(StreamChunkReader::HasMagic(s));
+  EXPECT_EQ(s.GetLong(), -7);
+  s.MoveTo(66 + 50);
+  {
+    LengthReader len(s, true);
+    EXPECT_EQ(len.GetLength(), 16);
+    EXPECT_EQ(s.GetLong(), 1);
+  }
+  EXPECT_EQ(s.Position(), 66 + 66);
+}
+
+TEST(StreamChunk, TruncatedChunksFailAndReadersNeverThrowOnExit) {
+  const Bytes image = Hex("7C970F1A 50524546 0001 0001 00000004 11223344");
+  for (std::size_t cut = 0; cut < image.size(); ++cut) {
+    test::Reader s(Bytes(image.begin(), image.begin() + static_cast<std::ptrdiff_t>(cut)));
+    EXPECT_EQ(CodeOf([&] {
+                StreamChunkReader r(s);  // its destructor runs during the unwinding
+                (void)s.GetLong();
+              }),
+              -39)
+        << cut;
+  }
+}
+
+class EveryStream : public ::testing::TestWithParam<const char*> {};
+
+TEST_P(EveryStream, RecordsLongArraysAndALongTextRoundTrip) {
+  test::Channel channel(GetParam());
+  std::vector<int> longs(1000);
+  for (int i = 0; i < 1000; ++i) longs[static_cast<std::size_t>(i)] = i * 65537 - 7;
+  std::string text(70000, 'a');
+  for (std::size_t i = 0; i < text.size(); ++i) text[i] = static_cast<char>('a' + i % 26);
+  for (int i = 0; i < 100; ++i) PutRecord(channel.Out());
+  channel.Out().PutLongArray(longs.data(), 1000);
+  channel.Out().PutUString(UString(text));
+  channel.Out().PutShort(0x1234);
+  CStream& in = channel.In();
+  for (int i = 0; i < 100; ++i) CheckRecord(in);
+  std::vector<int> back(1000);
+  in.GetLongArray(back.data(), 1000);
+  EXPECT_EQ(back, longs);
+  UString cutText;
+  in.GetUString(cutText);
+  EXPECT_EQ(cutText.utf8_str(), text.substr(0, 65535)) << "cut, and the rest skipped";
+  EXPECT_EQ(in.GetShort(), 0x1234);
+  EXPECT_TRUE(in.AtEnd()) << "every byte read, none left";
+}
+
+INSTANTIATE_TEST_SUITE_P(Kinds, EveryStream, ::testing::ValuesIn(test::kChannelKinds),
+                         [](const auto& info) { return std::string(info.param); });
+
+// Every proper prefix of the record, through a handle stream and (every 7th)
+// a file stream, fails with end of file; nothing at all where a number text
+// starts is "no number text".
+TEST(Truncation, EveryCutOfARecordFailsWithEndOfFile) {
+  const Bytes image = test::ImageOf(PutRecord);
+  std::vector<int> expected(image.size(), -39);
+  std::size_t start = 0;
+  for (const test::Field& f : test::Record()) {
+    if (std::string(f.name).starts_with("number")) expected[start] = CStream::kNoNumberText;
+    start += Hex(f.hex).size();
+  }
+  for (std::size_t cut = 0; cut < image.size(); ++cut) {
+    const Bytes part(image.begin(), image.begin() + static_cast<std::ptrdiff_t>(cut));
+    test::Reader s(part);
+    ASSERT_EQ(CodeReadingRecord(s), expected[cut]) << "cut at " << cut;
+    // A memory area reads zeros past its data, never outside (sanitizers check).
+    PtrStream p(PtrStream::ReadOnly{}, part.data(), static_cast<std::int64_t>(cut));
+    const int code = CodeReadingRecord(p);
+    ASSERT_TRUE(code == 0 || code == -39 || code == CStream::kNoNumberText) << code;
+    ASSERT_LE(p.Position(), static_cast<std::int64_t>(cut));
+  }
+}
+
+TEST(PipedStream, TwoThreadsExchangeRecords) {
+  PipedStream out;
+  PipedStream in(out);
+  std::thread writer([&] {
+    for (int i = 0; i < 200; ++i) PutRecord(out);
+  });
+  for (int i = 0; i < 200; ++i) CheckRecord(in);
+  writer.join();
+}
+
+TEST(PipedStream, ReadAfterTheWriterIsGoneFailsWithEndOfFile) {
+  auto out = std::make_unique<PipedStream>();
+  PipedStream in(*out);
+  out->PutChar('x');
+  EXPECT_GT(in.Size(), 1'000'000'000) << "unbounded while the writer lives";
+  out.reset();
+  EXPECT_EQ(in.Size(), 1);
+  EXPECT_EQ(in.GetChar(), 'x');
+  EXPECT_EQ(CodeOf([&] { (void)in.GetShort(); }), -39);
+}
+
+TEST(CFileStream, EditsInPlaceAcrossBuffersAndTruncates) {
+  test::TempPath path("edit");
+  CFileStream io(4);
+  io.Open(File(path.Spec()).Open("w+b"), kTCLReadWriteMode);  // adopts an open file
+  for (int i = 0; i < 10; ++i) io.PutLong(i);
+  io.MoveTo(8);
+  EXPECT_EQ(io.GetLong(), 2);
+  io.PutLong(-3);  // overwrites element 3
+  EXPECT_EQ(io.GetLong(), 4) << "a read right after a write";
+  io.MoveTo(36);
+  io.PutLong(99);
+  io.PutShort(0x0102);  // extends the file
+  EXPECT_EQ(CodeOf([&] { io.MoveTo(43); }), CStream::kPositionOutOfRange);
+  EXPECT_EQ(CodeOf([&] { (void)io.GetLong(); }), -39);
+  io.Close();
+  std::ifstream file(path.path, std::ios::binary);
+  const Bytes bytes((std::istreambuf_iterator<char>(file)), {});
+  EXPECT_EQ(Bytes(bytes.begin() + 8, bytes.end()),
+            Hex("00000002 FFFFFFFD 00000004 00000005 00000006 00000007 00000008 00000063 0102"));
+}
+
+TEST(CFileStream, SixtyFourBitPositions) {
+  test::TempPath path("big");
+  CFileStream s(path.Spec());
+  s.Open(kTCLWriteMode);
+  const std::int64_t far = (std::int64_t{1} << 32) + 12;
+  s.Truncate(far);  // sparse on most file systems
+  s.MoveTo(far);
+  s.PutLong(0x0A0B0C0D);
+  s.MoveTo(far);
+  EXPECT_EQ(s.GetLong(), 0x0A0B0C0D);
+  EXPECT_EQ(s.Size(), far + 4);
+  s.Truncate(0);
+}
+
+TEST(CHandleStream, GrowsTrimsAndTruncatesWithZerosInTheCallersHandle) {
+  auto_handle<char> h(NewHandle(4));
+  std::memcpy(h.data(), "\0\0\0\x2A", 4);
+  {
+    CHandleStream s(h.get(), kTCLReadWriteMode, 2);
+    EXPECT_EQ(s.GetLong(), 42);
+    for (int i = 0; i < 3000; ++i) s.PutShort(static_cast<short>(i));
+    EXPECT_EQ(GetHandleSize(h.get()), 6004u) << "trimmed to the data";
+    EXPECT_EQ(CodeOf([&] { (void)s.DetachHandle(); }), -50) << "not the stream's own";
+    s.Truncate(6);
+    s.Truncate(9);
+  }
+  EXPECT_EQ(Bytes(h.data(), h.data() + h.size()), Hex("0000002A 0000 000000")) << "zeros";
+}
+
+TEST(PtrStream, IgnoresWhatDoesNotFit) {
+  unsigned char area[4] = {9, 9, 9, 9};
+  PtrStream s(area, 4);
+  s.PutLong(0x01020304);
+  s.MoveTo(2);
+  s.PutLong(0x0A0B0C0D);  // would pass the capacity
+  EXPECT_EQ(s.Position(), 2);
+  EXPECT_EQ(Bytes(area, area + 4), Hex("01020304"));
+  s.MoveTo(9);
+  EXPECT_EQ(s.Position(), 2) << "a move outside is ignored";
+  EXPECT_EQ(s.GetLong(), 0) << "a read past the data yields 0";
+  EXPECT_EQ(s.GetShort(), 0x0304);
+}
+
+}  // namespace
+}  // namespace tarn
