@@ -15,17 +15,19 @@ failed=()
 run_preset() {
   local p=$1
   echo "=== preset $p"
-  cmake --preset "$p" >/dev/null
-  cmake --build --preset "$p" -j "$jobs"
+  # Each step is checked by hand: run_preset is called inside `if`, where
+  # errexit does not apply.
+  cmake --preset "$p" >/dev/null || return 1
+  cmake --build --preset "$p" -j "$jobs" || return 1
   if [ "$p" = mingw ]; then
     . scripts/wine-env.sh
     tarn_wine_start
     trap tarn_wine_stop EXIT
   fi
-  ctest --preset "$p" -j "$jobs"
+  ctest --preset "$p" -j "$jobs" || return 1
   if [ "$p" = default ]; then
-    scripts/check-umbrella.sh
-    scripts/check-install.sh build/default
+    scripts/check-umbrella.sh || return 1
+    scripts/check-install.sh build/default || return 1
   fi
 }
 

@@ -12,8 +12,9 @@ TEST(AudioReadWriteBuffer, OwnedBorrowedAndHostBlocks) {
   EXPECT_TRUE(block.IsSilent() && block.OwnsData());
   for (int c = 0; c < 12; ++c) EXPECT_EQ(std::count(block[c], block[c] + 64, 0.0f), 64);
   EXPECT_EQ(AudioReadWriteBuffer(3, 8)[3], nullptr);
-  for (auto [channels, length] : {std::pair{13, 10}, {-1, 10}, {2, -1}})
-    EXPECT_EQ(ErrorOf([&] { AudioReadWriteBuffer(channels, length); }), -50) << channels;
+  for (const auto& shape : {std::pair{13, 10}, {-1, 10}, {2, -1}})
+    EXPECT_EQ(ErrorOf([&] { AudioReadWriteBuffer(shape.first, shape.second); }), -50)
+        << shape.first;
 
   std::vector<float> left(32, 1.0f), right(32, 2.0f);
   float* arrays[] = {left.data(), right.data()};
