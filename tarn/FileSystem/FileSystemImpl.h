@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <cstdio>
 
+#include "tarn/Errors/TarnError.h"
 #include "tarn/String/UString.h"
 
 namespace tarn {
@@ -33,6 +34,10 @@ enum class PathKind { kNone, kFile, kFolder, kOther };
 // its own on POSIX and on file systems without streams (which File carries
 // along when it renames or deletes).
 inline constexpr char kResourceForkSuffix[] = ":AFP_Resource";
+
+// Throws `error` with the path, or the two paths on two lines, attached.
+[[noreturn]] void ThrowWithPaths(TarnError error, const UString& path,
+                                 const UString* path2 = nullptr);
 
 // Operations; each throws the system's error as a TarnError (kind "Windows"
 // or "POSIX"), with the path as attachment.

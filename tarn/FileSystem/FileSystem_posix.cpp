@@ -21,14 +21,7 @@ std::string Native(const UString& path) { return path.utf8_str(); }
 // Throws errno (as left by the failed call) with the path(s) attached.
 [[noreturn]] void FailErrno(int err, const char* operation, const UString& path,
                             const UString* path2 = nullptr) {
-  TarnError error = ErrnoAsTarnError(err, "File I/O", operation);
-  UString attachment = path;
-  if (path2 != nullptr) {
-    attachment += '\n';
-    attachment += *path2;
-  }
-  error.SetAttachment(attachment);
-  throw error;
+  ThrowWithPaths(ErrnoAsTarnError(err, "File I/O", operation), path, path2);
 }
 
 }  // namespace

@@ -22,14 +22,7 @@ const wchar_t* Native(const UString& path) {
 // path(s) attached.
 [[noreturn]] void FailLastError(const char* operation, const UString& path,
                                 const UString* path2 = nullptr) {
-  TarnError error = GetLastErrorAsTarnError("File I/O", operation);
-  UString attachment = path;
-  if (path2 != nullptr) {
-    attachment += '\n';
-    attachment += *path2;
-  }
-  error.SetAttachment(attachment);
-  throw error;
+  ThrowWithPaths(GetLastErrorAsTarnError("File I/O", operation), path, path2);
 }
 
 // 100-ns intervals from 1601-01-01 to 1970-01-01.
