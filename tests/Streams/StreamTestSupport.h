@@ -193,8 +193,16 @@ inline const std::vector<Field>& Record() {
       {"long min", [](Io& io) { io.Long(std::numeric_limits<int>::min()); }, "80000000"},
       {"longlong", [](Io& io) { io.LongLong(0x0102030405060708); }, "0102030405060708"},
       {"longlong -2", [](Io& io) { io.LongLong(-2); }, "FFFFFFFFFFFFFFFE"},
-      {"point", [](Io& io) { io.Point(tarnPoint{1, -1}); }, "0001 FFFF"},
-      {"rect", [](Io& io) { io.Rect(tarnRect{1, 2, -3, 4}); }, "0001 0002 FFFD 0004"},
+      {"point",
+       [](Io& io) {
+         io.Point(tarnPoint{1, -1});
+       },
+       "0001 FFFF"},
+      {"rect",
+       [](Io& io) {
+         io.Rect(tarnRect{1, 2, -3, 4});
+       },
+       "0001 0002 FFFD 0004"},
       {"number text", [](Io& io) { io.NumberText(-1234.5); }, "2D313233342E35 00"},
       {"double", [](Io& io) { io.Double(-2.5); }, "C004000000000000"},
       {"double -0", [](Io& io) { io.Double(-0.0); }, "8000000000000000"},
