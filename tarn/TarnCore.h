@@ -63,7 +63,6 @@
 #include "tarn/Time/FixedUtils.h"
 #include "tarn/Time/Frac.h"
 #include "tarn/Time/SampleCount.h"
-#include "tarn/Time/SampleCountLimits.h"
 #include "tarn/Time/Stopwatch.h"
 #include "tarn/Time/TarnSystemTime.h"
 #include "tarn/Time/Tick.h"

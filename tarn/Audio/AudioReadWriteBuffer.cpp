@@ -3,7 +3,7 @@
 #include <algorithm>
 
 #include "tarn/Errors/Fail.h"
-#include "tarn/Time/SampleCountLimits.h"
+#include "tarn/Time/SampleCount.h"
 
 namespace tarn {
 namespace {

@@ -91,6 +91,11 @@ class SampleCount {
   std::int64_t value_ = 0;
 };
 
+// The largest and smallest sample positions the library uses as sentinels:
+// ±(2^48 - 1), far beyond any real recording yet safe to add lengths to.
+inline constexpr SampleCount kLargestSampleCount{281474976710655LL};
+inline constexpr SampleCount kSmallestSampleCount{-281474976710655LL};
+
 class SampleCountFrac {
  public:
   constexpr SampleCountFrac() noexcept = default;
