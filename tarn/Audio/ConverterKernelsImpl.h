@@ -16,9 +16,10 @@
 
 namespace tarn::ConverterKernels {
 
-// `stream` asks for stores that bypass the caches, for runs far larger than
-// the caches; it takes effect only where the destination is aligned to the
-// vector size and every store is one whole vector, and is ignored otherwise.
+// `stream` marks a run far larger than the caches: the kernel fetches its
+// source ahead of use, and its stores bypass the caches where the
+// destination is aligned to the vector size and every store is one whole
+// vector.
 using Kernel = int (*)(const std::uint8_t* source, std::uint8_t* destination, int count,
                        std::uint32_t* ditherState, bool stream) noexcept;
 
