@@ -1,9 +1,13 @@
 #include "tarn/Threads/TarnJobThread.h"
 #include "tarn/Threads/TarnMainThread.h"
 
+#include <cstdio>
+#include <cstdlib>
 #include <string>
+#include <vector>
 
 #include "ThreadsTestUtil.h"
+#include "tarn/Basics/Singleton.h"
 #include "tarn/Basics/TarnCoreLibCallbacks.h"
 #include "tarn/Threads/CIdleChore.h"
 #include "tarn/Threads/TarnThread.h"
@@ -278,6 +282,38 @@ TEST(TarnMainThread, JobsRunOnTheMainThread) {
   for (int spins = 0; spins < 2000 && !finished; ++spins) PumpMainThreadFor(5ms);
   workers.join();
   EXPECT_EQ(sum.load(), 3 * 190 + 20 * (0 + 1 + 2));
+}
+
+// Unload (the process-wide singletons' destruction) cancels every job the
+// main thread has not taken yet and waits for the feeder, so a thread waiting
+// for such a job gets "Job cancelled" instead of waiting forever. Runs in a
+// child process: the feeder cannot be built again once destroyed.
+TEST(TarnMainThreadDeathTest, UnloadCancelsJobsNotHandedOver) {
+  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  EXPECT_EXIT(
+      {
+        TarnMainThread& feeder = TarnMainThread::Instance();
+        std::vector<std::shared_ptr<TarnPromise<int>>> jobs;
+        for (int i = 0; i < 10; ++i) jobs.push_back(feeder.Post([i] { return i; }));
+        std::atomic<int> cancelled{0};
+        std::thread waiter([&] {
+          for (auto& job : jobs) {
+            if (!job->TimedWait(10'000'000'000)) break;  // left waiting: a fault
+            try {
+              (void)job->Get();
+            } catch (const TarnError& e) {
+              cancelled += IsJobCancelled(e) ? 1 : 0;
+            }
+          }
+        });
+        std::this_thread::sleep_for(20ms);  // let the feeder hand some over
+        SingletonManager::Instance().DestroyAll();
+        waiter.join();
+        std::fprintf(stderr, "cancelled %d\n", cancelled.load());
+        std::fflush(stderr);
+        std::_Exit(0);
+      },
+      testing::ExitedWithCode(0), "cancelled 10");
 }
 
 TEST(TarnMainThread, InterruptStatusNamesMainAndInterruptThreads) {
