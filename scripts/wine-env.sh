@@ -7,15 +7,13 @@ export WINEDLLOVERRIDES="mscoree,mshtml="
 export WINEARCH=win64
 tarn_wine_start() {
   mkdir -p "$WINEPREFIX"
-  # The persistent server starts first, detached from our output, so that
-  # the system processes it and wineboot start (services, devices, desktop)
-  # never hold a test's output pipe open: CTest waits for that pipe to close.
+  # The persistent server starts before wineboot, so that it is this server
+  # that keeps the system processes wineboot starts alive between tests
+  # (a server wineboot started itself would shut down soon after).
   wineserver -p </dev/null >/dev/null 2>&1 || true
   if [ ! -f "$WINEPREFIX/system.reg" ]; then
     /usr/lib/wine/wine64 wineboot --init </dev/null >/dev/null 2>&1 || true
   fi
-  # One throwaway process brings up the on-demand services the same way.
-  /usr/lib/wine/wine64 cmd /c exit </dev/null >/dev/null 2>&1 || true
 }
 tarn_wine_stop() {
   wineserver -k >/dev/null 2>&1 || true
