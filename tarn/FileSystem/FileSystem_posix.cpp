@@ -59,6 +59,13 @@ void CreateNewFile(const UString& path) {
 
 std::FILE* OpenFile(const UString& path, const char* mode, bool throwOnFailure) {
   std::FILE* f = std::fopen(Native(path).c_str(), mode);
+  // A folder opens for reading here but not on Windows: refuse it alike.
+  struct stat st;
+  if (f != nullptr && ::fstat(::fileno(f), &st) == 0 && S_ISDIR(st.st_mode)) {
+    std::fclose(f);
+    f = nullptr;
+    errno = EISDIR;
+  }
   if (f == nullptr && throwOnFailure) FailErrno(errno, "open", path);
   return f;
 }
