@@ -9,9 +9,15 @@
 #include "tarn/Audio/SampleBuffer.h"
 #include "tarn/Audio/SampleFormat.h"
 
+#include "tarn/Audio/SoundFileFormats/RIFFFileEditor.h"
+#include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
+#include "tarn/Audio/SoundFileFormats/RIFFType.h"
+#include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
+
 #include "tarn/Basics/ConstantString.h"
 #include "tarn/Basics/Endian.h"
 #include "tarn/Basics/Handle.h"
+#include "tarn/Basics/RCBlobMT.h"
 #include "tarn/Basics/Singleton.h"
 #include "tarn/Basics/Smoosher.h"
 #include "tarn/Basics/TarnCoreLibCallbacks.h"

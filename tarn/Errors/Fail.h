@@ -69,6 +69,10 @@ void do_FailCOMError(int hr, const char* file, int line);
 // path of spec (or of spec1, "\n", spec2). Defined with FileSpecification.
 void FailFSErr(short code, const FileSpecification& spec);
 void FailFSErr(short code, const FileSpecification& spec1, const FileSpecification& spec2);
+// Kind, system and subsystem `className` (the format class that found the
+// file malformed: "RIFFFileEditor", "WAVEReader", "AIFFReader"), the code,
+// attachment the display path of spec. Defined with FileSpecification.
+[[noreturn]] void FailFormatError(const char* className, int code, const FileSpecification& spec);
 
 // p null: code 1 as do_Failure(-108), code 2 as do_FailNILRes, any other code
 // kind "FailNULL", system "MemSys", that code, message as the optional error

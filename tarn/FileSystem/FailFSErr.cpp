@@ -29,4 +29,8 @@ void FailFSErr(short code, const FileSpecification& spec1, const FileSpecificati
   if (code != 0) fsimpl::ThrowWithPaths(FSErr(code), spec1.GetDisplayPath(), &path2);
 }
 
+void FailFormatError(const char* className, int code, const FileSpecification& spec) {
+  fsimpl::ThrowWithPaths(TarnError(className, className, className, code), spec.GetDisplayPath());
+}
+
 }  // namespace tarn
