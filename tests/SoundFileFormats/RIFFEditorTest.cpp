@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <atomic>
 #include <random>
 #include <thread>
 
@@ -52,6 +53,8 @@ void ExpectListing(const std::vector<Listed>& got, const std::vector<Listed>& wa
     EXPECT_EQ(got[i].length, want[i].length) << i;
   }
 }
+
+RCBlobMT Blob(const Bytes& bytes) { return RCBlobMT(bytes.data(), bytes.size()); }
 
 std::int64_t FormEnd(Container c) { return IsWave64(c) ? 40 : 12; }
 
@@ -188,6 +191,30 @@ TEST(RIFFEditorListing, LyingFilesStopOrStretchAsTheyShould) {
   }
 }
 
+// A last chunk cut short by less than the file's length stays listed at its
+// claimed size; an edit then refuses to start rather than move or append
+// around missing bytes.
+TEST(RIFFEditorEdits, TruncatedLastChunkIsRefusedUntouched) {
+  TempDir dir;
+  const auto path = dir.Path("f");
+  for (RIFFType last : {kList, kData}) {
+    Bytes image = FileImage({{kFmt, Pattern(200)}, {kData, Pattern(300)}, {kList, Pattern(40)}},
+                            Container::kRIFF);
+    if (last == kData) image.resize(image.size() - 48 - 20);
+    image.resize(image.size() - 20);
+    WriteFile(path, image);
+    RIFFFileEditor editor(SpecOf(path), kRIFFLittleEndian, GetWaveRIFFFormatHandler());
+    editor.ReadChunkLocations(nullptr);
+    ASSERT_EQ(editor.GetChunkList().back().first.tag, last);
+    EXPECT_FALSE(editor.AudioRunsToEndOfFile());
+    const auto error = ErrorOf([&] { editor.AddChunkData({kBext, {}, Blob(Pattern(4))}, kData); });
+    ASSERT_TRUE(error);
+    EXPECT_STREQ(error->GetKind().c_str(), "RIFFFileEditor");
+    EXPECT_EQ(error->GetIntErrorCode(), RIFFFileEditor::kChunkPastEndOfFile);
+    EXPECT_EQ(ReadFile(path), image);
+  }
+}
+
 TEST(RIFFEditorListing, RiffWithoutTheWave64IdentifierIsClassic) {
   TempDir dir;
   Bytes image = FileImage({{kFmt, Pattern(2)}, {kData, Pattern(4)}}, Container::kRIFF);
@@ -320,8 +347,6 @@ Bytes AudioPayload(const std::filesystem::path& path, Container c) {
   ADD_FAILURE() << "no audio chunk listed";
   return {};
 }
-
-RCBlobMT Blob(const Bytes& bytes) { return RCBlobMT(bytes.data(), bytes.size()); }
 
 TEST(RIFFEditorEdits, RandomEditSequencesMatchTheModel) {
   TempDir dir;
@@ -460,6 +485,39 @@ TEST(RIFFEditorEdits, UpdateUUIDsFromTagsJunksTagsWithoutIdentifier) {
       ReadFile(path),
       FileImage({{kFmt, Pattern(2)}, {kJunk, Pattern(6)}, {kData, Pattern(2)}, {kBext, Pattern(2)}},
                 Container::kRIFF));
+}
+
+// Readers on several threads and a writer share one editor: the lock makes
+// every read see one whole version of the chunk, never a mix of two.
+TEST(RIFFEditorThreads, ReadsAndEditsOfOneEditorSerialise) {
+  TempDir dir;
+  const auto path = dir.Path("f");
+  WriteFile(path, FileImage({{kBext, Bytes(600, 0)}, {kData, Pattern(64)}}, Container::kRIFF));
+  RIFFFileEditor editor(SpecOf(path), kRIFFLittleEndian, GetWaveRIFFFormatHandler());
+  editor.ReadChunkLocations(nullptr);
+  std::atomic<bool> stop{false};
+  std::vector<std::thread> readers;
+  std::atomic<int> reads{0};
+  for (int t = 0; t < 3; ++t) {
+    readers.emplace_back([&] {
+      while (!stop.load()) {
+        const RCBlobMT blob = editor.ReadChunkData(kBext);
+        ASSERT_EQ(blob.GetSize(), 600);
+        const std::uint8_t first = blob.GetPtr()[0];
+        ASSERT_TRUE(std::all_of(blob.GetPtr(), blob.GetPtr() + 600,
+                                [first](std::uint8_t b) { return b == first; }));
+        ASSERT_EQ(editor.CountPostAudioChunks(kData), 0);
+        ++reads;
+      }
+    });
+  }
+  for (int round = 1; round <= 200; ++round)
+    editor.AddChunkData({kBext, {}, Blob(Bytes(600, static_cast<std::uint8_t>(round)))}, kData);
+  while (reads.load() < 50) std::this_thread::yield();
+  stop = true;
+  for (auto& r : readers) r.join();
+  EXPECT_EQ(ReadFile(path),
+            FileImage({{kBext, Bytes(600, 200)}, {kData, Pattern(64)}}, Container::kRIFF));
 }
 
 // ------------------------------------------------------------------ tables

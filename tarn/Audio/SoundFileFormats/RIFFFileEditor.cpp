@@ -386,6 +386,15 @@ void RIFFFileEditor::AddChunkData(const ChunkData& chunk, RIFFType audioTag) {
   Access access(*stream_, kTCLReadWriteMode);
 
   const int headerSize = GetRiffHeaderSize();
+  if (!chunks_.empty()) {
+    // A truncated last chunk (its size passes the end of the file, though by
+    // less than the whole file's length) could be neither moved nor
+    // appended to: refuse before anything is written.
+    const ChunkInfo& last = chunks_.back().first;
+    if (last.tag != kNullTag && last.offset + headerSize + last.length >
+                                    WAVEWriter::PadDataLength(stream_->Size(), wave64_))
+      FailFormatError("RIFFFileEditor", kChunkPastEndOfFile, stream_->GetSpecification());
+  }
   std::int64_t shift = 0;
   std::int64_t end = GetIDSize() + (wave64_ ? 8 : 4) + WAVEWriter::GetRIFFChunkExtraSize(wave64_);
   bool written = false;

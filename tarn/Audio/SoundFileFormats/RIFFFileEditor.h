@@ -42,12 +42,16 @@
 // Errors: a file that is not an accepted container, or whose form type is
 // refused, throws kind/system/subsystem "RIFFFileEditor" code 0 from the
 // listing (an empty or truncated container header included);
-// GetOffsetToChunkStart for an absent tag throws "RIFFFileEditor" code 1; a
+// GetOffsetToChunkStart for an absent tag throws "RIFFFileEditor" code 1;
+// AddChunkData on a file whose last listed chunk is cut short (its size
+// passes the end of the file, though by less than the file's whole length,
+// so the listing keeps it) throws "RIFFFileEditor" code 2 and writes nothing; a
 // chunk to write that has no identifier in Wave64 mode throws -50 before the
 // file is touched; stream errors (-36 I/O, -39 end of file, -5000 cannot
-// open) propagate. A damaged chunk header, a truncated chunk or a non-audio
-// chunk whose size passes the file's length ends the listing silently: the
-// chunks before it stay listed.
+// open) propagate. A damaged or truncated chunk header, or a non-audio chunk
+// whose size is larger than the whole file, ends the listing silently: the
+// chunks before it stay listed. An audio chunk that large is listed as
+// running to the end of the file (AudioRunsToEndOfFile).
 //
 // Threads: ReadChunkData, AddChunkData, CountPostAudioChunks,
 // GetNthPostAudioChunks, RemoveTrailingMetaData and Reset take the editor's
@@ -84,6 +88,7 @@ class RIFFFileEditor {
   // Codes of the "RIFFFileEditor" errors.
   static constexpr int kNotAChunkFile = 0;
   static constexpr int kChunkNotFound = 1;
+  static constexpr int kChunkPastEndOfFile = 2;
 
   // One chunk of the file, in file order.
   struct ChunkInfo {
