@@ -50,13 +50,6 @@ struct ChunkSpec {
   bool pad = true;
 };
 
-// The tag of four characters given at run time.
-inline RIFFType Tag4(const char* code) {
-  RIFFType tag = 0;
-  for (int i = 0; i < 4; ++i) tag = tag << 8 | static_cast<unsigned char>(code[i]);
-  return tag;
-}
-
 inline Bytes Text(std::string_view text) { return Bytes(text.begin(), text.end()); }
 
 // `count` bytes counting up from `seed`, so moved or mixed-up bytes show.

@@ -532,7 +532,7 @@ TEST(RIFFEditorTables, TagIDTableIncludingTheDoubleEntry) {
                           {"qzcu", 1050}, {"qzmu", 1051}, {"qzuc", 1052}, {"MLo1", 1022},
                           {"qzdt", 1025}, {"MLo2", 1026}, {"ANNO", 1021}};
   for (const Pair& p : numbers) {
-    const RIFFType tag = Tag4(p.tag);
+    const RIFFType tag = RIFFTypeFromChars(p.tag);
     EXPECT_EQ(RIFFFileEditor::FindIDForTag(tag), p.id) << p.tag;
     EXPECT_EQ(RIFFFileEditor::FindTagForID(p.id), tag) << p.tag;
   }
@@ -543,7 +543,7 @@ TEST(RIFFEditorTables, TagIDTableIncludingTheDoubleEntry) {
   EXPECT_EQ(RIFFFileEditor::FindTagForID(MakeRIFFType("QZtd")), MakeRIFFType("qzte"));
   for (const char* same : {"bext", "levl", "qzod", "Rec!", "SmpI", "ddOV", "Dscr", "AUTH", "(c) ",
                            "ACdI", "basc", "acid", "regn"}) {
-    const RIFFType tag = Tag4(same);
+    const RIFFType tag = RIFFTypeFromChars(same);
     EXPECT_EQ(RIFFFileEditor::FindIDForTag(tag), tag) << same;
     EXPECT_EQ(RIFFFileEditor::FindTagForID(tag), tag) << same;
   }
@@ -570,7 +570,7 @@ TEST(RIFFEditorTables, Wave64IdentifiersAsPublishedAndOurOwn) {
       {"SmLt", "bc945f92-5a52-d211-86dc-00c04f8edb8a"},
   };
   for (const auto& p : published) {
-    const RIFFType tag = Tag4(p.tag);
+    const RIFFType tag = RIFFTypeFromChars(p.tag);
     const UUIDObj id{UString(p.id)};
     EXPECT_EQ(wave.UUIDForTag(tag, false), id) << p.tag;
     EXPECT_EQ(wave.UUIDForTag(tag, true), id) << p.tag;
@@ -594,7 +594,7 @@ TEST(RIFFEditorTables, Wave64IdentifiersAsPublishedAndOurOwn) {
         "qzmu", "qzuc", "qzrn", "qzte", "qzod", "Rec!", "MLo1", "qzdt", "MLo2", "SmpI",
         "ddOV", "ANNO", "Dscr", "AUTH", "(c) ", "ACdI", "basc", "acid", "regn", "qzfd",
         "qzf1", "qzf2", "qzf3", "qzf4", "qzf5", "qzf6", "qzf7", "qzf8", "qzf9", "qzfa"}) {
-    const RIFFType tag = Tag4(own);
+    const RIFFType tag = RIFFTypeFromChars(own);
     const UUIDObj id = wave.UUIDForTag(tag, true);
     EXPECT_FALSE(id.IsClear()) << own;
     EXPECT_EQ(wave.TagForUUID(id), tag) << own;

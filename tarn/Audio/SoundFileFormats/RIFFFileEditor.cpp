@@ -19,10 +19,6 @@ constexpr int kMoveBlockSize = 4096;
 // of a position and a length far from overflow.
 constexpr std::int64_t kHugeLength = std::int64_t{1} << 62;
 
-RIFFType TagFromBytes(const std::uint8_t* b) noexcept {
-  return RIFFType{b[0]} << 24 | RIFFType{b[1]} << 16 | RIFFType{b[2]} << 8 | RIFFType{b[3]};
-}
-
 // The metadata tag <-> resource number table, searched from the top.
 constexpr std::array<std::pair<RIFFType, std::uint32_t>, 32> kTagIDTable{{
     {MakeRIFFType("qzma"), 1001},
@@ -129,7 +125,7 @@ RIFFType RIFFFileEditor::ReadRIFFType(UUIDObj& uuid) {
   std::uint8_t bytes[4];
   stream_->GetRawDataFromStream(bytes, 4);
   uuid = UUIDObj();
-  return TagFromBytes(bytes);
+  return RIFFTypeFromChars(reinterpret_cast<const char*>(bytes));
 }
 
 std::uint64_t RIFFFileEditor::ReadLength() {
@@ -163,7 +159,7 @@ RIFFType RIFFFileEditor::ReadRIFFChunk() {
   try {
     std::uint8_t first[4];
     stream_->GetRawDataFromStream(first, 4);
-    if (!handler_.IsContainerID(TagFromBytes(first)))
+    if (!handler_.IsContainerID(RIFFTypeFromChars(reinterpret_cast<const char*>(first))))
       FailFormatError("RIFFFileEditor", kNotAChunkFile, stream_->GetSpecification());
     wave64_ = false;
     if (handler_.SupportsWave64() && stream_->Size() - start >= 16) {

@@ -46,12 +46,6 @@ constexpr std::array<const char*, 40> kOwnTags{
     "ddOV", "ANNO", "Dscr", "AUTH", "(c) ", "ACdI", "basc", "acid", "regn", "qzfd",
     "qzf1", "qzf2", "qzf3", "qzf4", "qzf5", "qzf6", "qzf7", "qzf8", "qzf9", "qzfa"};
 
-RIFFType Tag(const char* code) {
-  RIFFType tag = 0;
-  for (int i = 0; i < 4; ++i) tag = tag << 8 | static_cast<unsigned char>(code[i]);
-  return tag;
-}
-
 bool UUIDLess(const UUIDObj& a, const UUIDObj& b) { return a.GetBytes() < b.GetBytes(); }
 
 }  // namespace
@@ -68,7 +62,7 @@ AIFF_RIFF_FormatHandler& GetAIFFRIFFFormatHandler() {
 
 WaveRIFFFormatHandler::WaveRIFFFormatHandler() {
   const auto published = [](const char* tag, const char* id, const Bytes12& suffix) {
-    return Entry{Tag(tag), MakeID(Tag(id), suffix)};
+    return Entry{RIFFTypeFromChars(tag), MakeID(RIFFTypeFromChars(id), suffix)};
   };
   byTag_ = {
       {0, UUIDObj()},
@@ -84,7 +78,8 @@ WaveRIFFFormatHandler::WaveRIFFFormatHandler() {
       {MakeRIFFType("MRKR"), kMarkerID},
       {MakeRIFFType("SmLt"), kSummaryListID},
   };
-  for (const char* tag : kOwnTags) byTag_.push_back({Tag(tag), MakeID(Tag(tag), kOwnSuffix)});
+  for (const char* tag : kOwnTags)
+    byTag_.push_back({RIFFTypeFromChars(tag), MakeID(RIFFTypeFromChars(tag), kOwnSuffix)});
   byUUID_ = byTag_;
   byUUID_.push_back({MakeRIFFType("levl"), MakeID(MakeRIFFType("levl"), kLevlVariant)});
   byUUID_.push_back({MakeRIFFType("bext"), MakeID(MakeRIFFType("bext"), kBextVariant)});

@@ -11,12 +11,16 @@ namespace tarn {
 
 using RIFFType = std::uint32_t;
 
+// The code of the four characters at `code` (which need not be terminated).
+[[nodiscard]] constexpr RIFFType RIFFTypeFromChars(const char* code) noexcept {
+  RIFFType type = 0;
+  for (int i = 0; i < 4; ++i) type = type << 8 | static_cast<unsigned char>(code[i]);
+  return type;
+}
+
 // The code of a four-character literal: MakeRIFFType("data").
 [[nodiscard]] constexpr RIFFType MakeRIFFType(const char (&code)[5]) noexcept {
-  return static_cast<RIFFType>(static_cast<unsigned char>(code[0])) << 24 |
-         static_cast<RIFFType>(static_cast<unsigned char>(code[1])) << 16 |
-         static_cast<RIFFType>(static_cast<unsigned char>(code[2])) << 8 |
-         static_cast<RIFFType>(static_cast<unsigned char>(code[3]));
+  return RIFFTypeFromChars(code);
 }
 
 // The four characters, first character first; bytes outside printable ASCII
