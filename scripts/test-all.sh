@@ -9,12 +9,25 @@ export CCACHE_BASEDIR="$PWD"
 jobs=$(nproc)
 
 presets=("$@")
-[ ${#presets[@]} -gt 0 ] || presets=(default clang asan tsan mingw)
+if [ ${#presets[@]} -eq 0 ]; then
+  presets=(default clang asan tsan mingw)
+  # The fuzz step (scripts/run-fuzz.sh) needs clang's libFuzzer runtime.
+  if echo 'extern "C" int LLVMFuzzerTestOneInput(const char*, unsigned long) { return 0; }' |
+    clang++ -x c++ -fsanitize=fuzzer -o /dev/null - 2>/dev/null; then
+    presets+=(fuzz)
+  else
+    echo "fuzz: skipped, clang's libFuzzer runtime is missing (Debian: libclang-rt-14-dev)"
+  fi
+fi
 
 failed=()
 run_preset() {
   local p=$1
   echo "=== preset $p"
+  if [ "$p" = fuzz ]; then
+    scripts/run-fuzz.sh || return 1
+    return 0
+  fi
   # Each step is checked by hand: run_preset is called inside `if`, where
   # errexit does not apply.
   cmake --preset "$p" >/dev/null || return 1

@@ -1,0 +1,454 @@
+// Fuzz target of RIFFFileEditor: arbitrary bytes are listed as a file with
+// both format handlers, queried, and then edited in place on a copy.
+//
+// The whole input is the file. Its last bytes, read backwards, also choose
+// the edit sequence, so that any real sound file is a useful seed as it is.
+//
+// Checked on every input (a violation aborts, which libFuzzer reports):
+//   - nothing but TarnError escapes the editor;
+//   - the listing walks from header to header: offsets increase, each chunk
+//     starts where the one before ends, each header lies inside the file;
+//   - the queries agree with the listing, and chunk data read back is the
+//     file's own bytes, never more than the file holds;
+//   - after every edit the audio payload (the bytes of the first audio chunk
+//     that lie inside the original file) is byte-identical, and a fresh
+//     editor still lists the audio chunk at its old offset;
+//   - a chunk that AddChunkData reports written reads back from a fresh
+//     editor with the payload given.
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "tarn/Audio/SoundFileFormats/RIFFFileEditor.h"
+#include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
+#include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
+#include "tarn/Errors/TarnError.h"
+#include "tarn/FileSystem/FileSpecification.h"
+
+namespace tarn {
+namespace {
+
+using Bytes = std::vector<std::uint8_t>;
+
+// Inputs larger than this are skipped: the editor's cost grows with the file
+// and small files reach every path.
+constexpr std::size_t kMaxInput = 64 * 1024;
+// Payloads of added chunks stay small so each run stays fast.
+constexpr std::size_t kMaxPayload = 600;
+constexpr int kMaxEdits = 4;
+// ReadChunkData is tried on at most this many listed chunks.
+constexpr std::size_t kMaxReads = 8;
+
+constexpr RIFFType kDataTag = MakeRIFFType("data");
+constexpr RIFFType kSoundTag = MakeRIFFType("SSND");
+
+[[noreturn]] void Violation(const char* what, std::int64_t a = 0, std::int64_t b = 0) {
+  std::fprintf(stderr, "RiffEditorFuzz: invariant violated: %s (%lld, %lld)\n", what,
+               static_cast<long long>(a), static_cast<long long>(b));
+  std::abort();
+}
+
+#define TARN_FUZZ_CHECK(cond, ...)                            \
+  do {                                                        \
+    if (!(cond)) Violation(#cond __VA_OPT__(, ) __VA_ARGS__); \
+  } while (false)
+
+// Two scratch files per process, reused by every run: the input as given
+// (listed only) and the copy that is edited.
+struct Scratch {
+  std::filesystem::path original;
+  std::filesystem::path copy;
+  Scratch() {
+    std::error_code ec;
+    std::filesystem::path dir = "/dev/shm";
+    if (!std::filesystem::is_directory(dir, ec)) dir = std::filesystem::temp_directory_path();
+    const std::string stem = "tarn-riff-fuzz-" + std::to_string(::getpid());
+    original = dir / (stem + "-in.bin");
+    copy = dir / (stem + "-edit.bin");
+  }
+  Scratch(const Scratch&) = delete;
+  Scratch& operator=(const Scratch&) = delete;
+  ~Scratch() {
+    std::error_code ignored;
+    std::filesystem::remove(original, ignored);
+    std::filesystem::remove(copy, ignored);
+  }
+};
+
+Scratch& GetScratch() {
+  static Scratch scratch;
+  return scratch;
+}
+
+void WriteBytes(const std::filesystem::path& path, const std::uint8_t* data, std::size_t size) {
+  std::FILE* f = std::fopen(path.c_str(), "wb");
+  if (f == nullptr) Violation("cannot create the scratch file");
+  if (size > 0 && std::fwrite(data, 1, size, f) != size) Violation("cannot write the scratch file");
+  if (std::fclose(f) != 0) Violation("cannot close the scratch file");
+}
+
+Bytes ReadBytes(const std::filesystem::path& path) {
+  Bytes out;
+  std::FILE* f = std::fopen(path.c_str(), "rb");
+  if (f == nullptr) Violation("cannot open the scratch file");
+  std::uint8_t buffer[4096];
+  for (;;) {
+    const std::size_t n = std::fread(buffer, 1, sizeof buffer, f);
+    out.insert(out.end(), buffer, buffer + n);
+    if (n < sizeof buffer) break;
+  }
+  std::fclose(f);
+  return out;
+}
+
+FileSpecification SpecOf(const std::filesystem::path& path) {
+  return FileSpecification(UString(path.c_str()));
+}
+
+// Control bytes, taken from the end of the input backwards; zero once spent.
+class Control {
+ public:
+  Control(const std::uint8_t* data, std::size_t size) : data_(data), left_(size) {}
+  std::uint8_t Next() { return left_ == 0 ? 0 : data_[--left_]; }
+
+ private:
+  const std::uint8_t* data_;
+  std::size_t left_;
+};
+
+// Tags the edits use: metadata tags with and without a Wave64 identifier,
+// the junk tag, both audio tags and the null tag (which AddChunkData refuses).
+constexpr RIFFType kEditTags[] = {
+    MakeRIFFType("bext"),
+    MakeRIFFType("LIST"),
+    MakeRIFFType("qzma"),
+    MakeRIFFType("levl"),
+    MakeRIFFType("fmt "),
+    MakeRIFFType("COMT"),
+    MakeRIFFType("abcd"),
+    MakeRIFFType("JUNK"),
+    MakeRIFFType("ID3 "),
+    MakeRIFFType("acid"),
+    kDataTag,
+    kSoundTag,
+    RIFFFileEditor::kNullTag,
+};
+
+struct Facts {
+  bool listed = false;
+  RIFFFileEditor::ChunkList chunks;
+  bool wave64 = false;
+};
+
+// Lists `spec` and checks the listing and every query against the bytes.
+Facts ListAndQuery(const FileSpecification& spec, RIFFFileEndian endian,
+                   RIFFFileEditor::FormatHandler& handler, RIFFType audioTag, const Bytes& bytes) {
+  Facts facts;
+  const auto fileLength = static_cast<std::int64_t>(bytes.size());
+  RIFFFileEditor editor(spec, endian, handler);
+  try {
+    editor.ReadChunkLocations(nullptr);
+  } catch (const TarnError&) {
+    return facts;
+  }
+  facts.listed = true;
+  facts.chunks = editor.GetChunkList();
+  facts.wave64 = editor.IsWave64();
+  const int header = WAVEWriter::GetChunkHeaderSize(facts.wave64);
+
+  // The walk from header to header.
+  std::int64_t expected = (facts.wave64 ? 24 : 8) + WAVEWriter::GetRIFFChunkExtraSize(facts.wave64);
+  for (const auto& [info, action] : facts.chunks) {
+    TARN_FUZZ_CHECK(action == RIFFFileEditor::kKeepSegment, action);
+    TARN_FUZZ_CHECK(info.offset == expected, info.offset, expected);
+    TARN_FUZZ_CHECK(info.length >= 0, info.length);
+    TARN_FUZZ_CHECK(info.offset + header <= fileLength, info.offset, fileLength);
+    TARN_FUZZ_CHECK(facts.wave64 || info.uuid.IsClear());
+    expected = info.offset + header + info.length;
+  }
+
+  // Lookups agree with the listing.
+  for (const auto& entry : facts.chunks) {
+    const RIFFType tag = entry.first.tag;
+    TARN_FUZZ_CHECK(editor.HasChunk(tag));
+    const auto first = std::find_if(facts.chunks.begin(), facts.chunks.end(),
+                                    [tag](const auto& e) { return e.first.tag == tag; });
+    TARN_FUZZ_CHECK(editor.GetOffsetToChunkStart(tag) == first->first.offset);
+  }
+  constexpr RIFFType kAbsent = MakeRIFFType("\x01zz\x02");
+  if (!editor.HasChunk(kAbsent)) {
+    bool threw = false;
+    try {
+      (void)editor.GetOffsetToChunkStart(kAbsent);
+    } catch (const TarnError& e) {
+      threw = e.GetIntErrorCode() == RIFFFileEditor::kChunkNotFound;
+    }
+    TARN_FUZZ_CHECK(threw);
+  }
+
+  // Chunk data is the file's bytes after the chunk's header.
+  std::size_t reads = 0;
+  for (const auto& [info, action] : facts.chunks) {
+    if (reads++ == kMaxReads) break;
+    const auto first = editor.GetOffsetToChunkStart(info.tag);
+    UUIDObj uuid;
+    RCBlobMT blob;
+    try {
+      blob = editor.ReadChunkData(info.tag, uuid);
+    } catch (const TarnError&) {
+      continue;
+    }
+    const std::int64_t start = first + header;
+    TARN_FUZZ_CHECK(blob.GetSize() <= fileLength - start, blob.GetSize(), fileLength - start);
+    if (blob.GetSize() > 0)
+      TARN_FUZZ_CHECK(std::memcmp(blob.GetPtr(), bytes.data() + start, blob.GetSize()) == 0);
+  }
+
+  // The post-audio queries agree with the listing.
+  const auto audio = std::find_if(facts.chunks.begin(), facts.chunks.end(),
+                                  [&](const auto& e) { return e.first.tag == audioTag; });
+  const int post =
+      audio == facts.chunks.end() ? 0 : static_cast<int>(facts.chunks.end() - audio - 1);
+  try {
+    TARN_FUZZ_CHECK(editor.CountPostAudioChunks(audioTag) == post, post);
+    for (int n = 0; n <= std::min(post, 4); ++n) {
+      UUIDObj uuid;
+      const RIFFType tag = editor.GetNthPostAudioChunks(n, audioTag, uuid);
+      if (n == post) {
+        TARN_FUZZ_CHECK(tag == RIFFFileEditor::kNullTag, n);
+      } else {
+        TARN_FUZZ_CHECK(tag == (audio + n + 1)->first.tag, n);
+        TARN_FUZZ_CHECK(uuid == (audio + n + 1)->first.uuid, n);
+      }
+    }
+    UUIDObj uuid;
+    TARN_FUZZ_CHECK(editor.GetNthPostAudioChunks(-1, audioTag, uuid) == RIFFFileEditor::kNullTag);
+    const std::int64_t limit = bytes.empty() ? 0 : bytes[0] * 16;
+    const bool zero = editor.AudioDataIsZeroLength(audioTag, limit);
+    TARN_FUZZ_CHECK(zero == (audio != facts.chunks.end() && audio->first.length <= limit), zero);
+  } catch (const TarnError&) {
+  }
+  return facts;
+}
+
+// The audio payload's place in the original file: [begin, end).
+struct AudioRegion {
+  bool present = false;
+  std::int64_t offset = 0;
+  std::int64_t begin = 0;
+  std::int64_t end = 0;
+};
+
+// After an edit: the payload bytes are unchanged and a fresh editor lists the
+// audio chunk where it was.
+void CheckAudioKept(const Scratch& scratch, const Bytes& original, const AudioRegion& region,
+                    RIFFFileEndian endian, RIFFFileEditor::FormatHandler& handler,
+                    RIFFType audioTag) {
+  if (!region.present) return;
+  const Bytes now = ReadBytes(scratch.copy);
+  TARN_FUZZ_CHECK(static_cast<std::int64_t>(now.size()) >= region.end,
+                  static_cast<std::int64_t>(now.size()), region.end);
+  TARN_FUZZ_CHECK(std::equal(original.begin() + region.begin, original.begin() + region.end,
+                             now.begin() + region.begin),
+                  region.begin, region.end);
+  RIFFFileEditor fresh(SpecOf(scratch.copy), endian, handler);
+  try {
+    fresh.ReadChunkLocations(nullptr);
+  } catch (const TarnError& e) {
+    Violation("the edited file no longer lists", e.GetIntErrorCode());
+  }
+  TARN_FUZZ_CHECK(fresh.HasChunk(audioTag));
+  TARN_FUZZ_CHECK(fresh.GetOffsetToChunkStart(audioTag) == region.offset,
+                  fresh.GetOffsetToChunkStart(audioTag), region.offset);
+}
+
+// Known: a chunk appended over a listed null-tag entry (zero fill) leaves
+// that entry in the list at the new chunk's offset, with its old length. A
+// later AddChunkData that cuts a chunk before it moves the stale entry's
+// bytes back first, scrambling the chunk written over it; once the stale
+// entry is junked (MaybeJunkSegment of the null tag, or UpdateUUIDsFromTags,
+// which junks it for having no identifier), the cut counts its missing
+// header and moves later chunks back over the end of the audio payload. The
+// edit sequence stops while such an entry is listed, so that the fuzzer
+// looks for other faults.
+bool HasStaleNullEntry(const RIFFFileEditor& editor) {
+  const auto& chunks = editor.GetChunkList();
+  for (std::size_t i = 0; i + 1 < chunks.size(); ++i)
+    if (chunks[i].first.tag == RIFFFileEditor::kNullTag &&
+        chunks[i].first.offset >= chunks[i + 1].first.offset)
+      return true;
+  return false;
+}
+
+// Known: two ways for a fresh listing to take a chunk that AddChunkData
+// appended for part of an audio chunk before it.
+//   - An "SSND" chunk with size 0 is listed as running to the end of the
+//     file, yet AddChunkData appends after it instead of fixing its size.
+//   - Any "data" or "SSND" chunk whose size passes the end of the file marks
+//     the audio as running to the end, but the next AddChunkData fixes the
+//     size of the chunks with the caller's audio tag only; when the open
+//     chunk has the other tag (a "data" chunk in a FORM file), its size stays
+//     and later chunks are appended inside it.
+bool AppendedIntoOpenAudio(const RIFFFileEditor& fresh, const Bytes& bytes, RIFFType audioTag) {
+  const auto& chunks = fresh.GetChunkList();
+  if (chunks.empty()) return false;
+  const auto& last = chunks.back().first;
+  if (last.tag != kSoundTag && last.tag != kDataTag) return false;
+  if (fresh.AudioRunsToEndOfFile() && last.tag != audioTag) return true;
+  if (last.tag != kSoundTag) return false;
+  const std::int64_t at = last.offset + (fresh.IsWave64() ? 16 : 4);
+  const int width = fresh.IsWave64() ? 8 : 4;
+  if (at + width > static_cast<std::int64_t>(bytes.size())) return false;
+  return std::all_of(bytes.begin() + at, bytes.begin() + at + width,
+                     [](std::uint8_t b) { return b == 0; });
+}
+
+// A chunk AddChunkData wrote reads back as written.
+void CheckWritten(const Scratch& scratch, RIFFFileEndian endian,
+                  RIFFFileEditor::FormatHandler& handler, RIFFType audioTag, RIFFType tag,
+                  const RCBlobMT& payload) {
+  RIFFFileEditor fresh(SpecOf(scratch.copy), endian, handler);
+  try {
+    fresh.ReadChunkLocations(nullptr);
+  } catch (const TarnError& e) {
+    Violation("the edited file no longer lists", e.GetIntErrorCode());
+  }
+  if (!fresh.HasChunk(tag) && AppendedIntoOpenAudio(fresh, ReadBytes(scratch.copy), audioTag))
+    return;
+  TARN_FUZZ_CHECK(fresh.HasChunk(tag), static_cast<std::int64_t>(tag));
+  const RCBlobMT back = fresh.ReadChunkData(tag);
+  TARN_FUZZ_CHECK(back.SameBytes(payload), back.GetSize(), payload.GetSize());
+}
+
+void EditCopy(const std::uint8_t* data, std::size_t size, const Bytes& original) {
+  Scratch& scratch = GetScratch();
+  WriteBytes(scratch.copy, data, size);
+  const bool form = size >= 4 && std::memcmp(data, "FORM", 4) == 0;
+  const RIFFFileEndian endian = form ? kRIFFBigEndian : kRIFFLittleEndian;
+  RIFFFileEditor::FormatHandler& handler =
+      form ? static_cast<RIFFFileEditor::FormatHandler&>(GetAIFFRIFFFormatHandler())
+           : GetWaveRIFFFormatHandler();
+  const RIFFType audioTag = form ? kSoundTag : kDataTag;
+
+  RIFFFileEditor editor(SpecOf(scratch.copy), endian, handler);
+  try {
+    editor.ReadChunkLocations(nullptr);
+  } catch (const TarnError&) {
+    return;  // not a chunk file for this handler: nothing to edit
+  }
+  const auto fileLength = static_cast<std::int64_t>(size);
+  const int header = WAVEWriter::GetChunkHeaderSize(editor.IsWave64());
+  AudioRegion region;
+  for (const auto& [info, action] : editor.GetChunkList()) {
+    if (info.tag != audioTag) continue;
+    region.present = true;
+    region.offset = info.offset;
+    region.begin = info.offset + header;
+    region.end = std::min(region.begin + info.length, fileLength);
+    break;
+  }
+
+  // RIFF_EDITOR_FUZZ_TRACE=1 prints the listing and the edits, for reading a
+  // crash input.
+  static const bool trace = std::getenv("RIFF_EDITOR_FUZZ_TRACE") != nullptr;
+  if (trace) {
+    for (const auto& [info, action] : editor.GetChunkList())
+      std::fprintf(stderr, "listed %s at %lld length %lld\n", RIFFTypeToString(info.tag).c_str(),
+                   static_cast<long long>(info.offset), static_cast<long long>(info.length));
+  }
+  // Known (see AppendedIntoOpenAudio): chunks listed as audio that the edits
+  // do not treat as audio, and "SSND" chunks with size 0, make a fresh
+  // listing miss what is written after them, also once they are junked.
+  // Known too: when a cut chunk lies before a second audio chunk whose size
+  // AddChunkData fixes, that chunk's header is rewritten where it was instead
+  // of moving back, leaving stale bytes before it that end a fresh listing.
+  bool oddAudio = false;
+  int audioChunks = 0;
+  for (const auto& [info, action] : editor.GetChunkList()) {
+    if (info.tag != kDataTag && info.tag != kSoundTag) continue;
+    const std::int64_t at = info.offset + (editor.IsWave64() ? 16 : 4);
+    const bool sizeZero = at + 4 <= fileLength &&
+                          std::all_of(data + at, data + at + 4, [](auto b) { return b == 0; });
+    if (info.tag != audioTag || (info.tag == kSoundTag && sizeZero)) oddAudio = true;
+    if (info.tag == audioTag && ++audioChunks > 1) oddAudio = true;
+  }
+  Control control(data, size);
+  const int edits = control.Next() % kMaxEdits + 1;
+  for (int i = 0; i < edits && !HasStaleNullEntry(editor); ++i) {
+    const std::uint8_t op = control.Next();
+    const RIFFType tag = kEditTags[(op >> 2) % std::size(kEditTags)];
+    if (trace)
+      std::fprintf(stderr, "edit %d: op %d tag %s\n", i, op & 3, RIFFTypeToString(tag).c_str());
+    try {
+      switch (op & 3) {
+        case 0: {
+          // Payload length from one control byte (odd lengths included),
+          // filled from another.
+          const std::size_t length = control.Next() * std::size_t{3} % (kMaxPayload + 1);
+          const std::uint8_t seed = control.Next();
+          Bytes payload(length);
+          for (std::size_t k = 0; k < length; ++k) payload[k] = static_cast<std::uint8_t>(seed + k);
+          const RCBlobMT blob(payload.data(), payload.size());
+          if (trace) std::fprintf(stderr, "  AddChunkData payload %zu bytes\n", length);
+          const bool runsToEnd = editor.AudioRunsToEndOfFile();
+          editor.AddChunkData({tag, {}, blob}, audioTag);
+          CheckAudioKept(scratch, original, region, endian, handler, audioTag);
+          // A file whose audio ran to its end only has its audio header
+          // fixed; chunks named like audio or junk are not unique.
+          if (!runsToEnd && !oddAudio && tag != kDataTag && tag != kSoundTag &&
+              tag != RIFFFileEditor::kJunkTag)
+            CheckWritten(scratch, endian, handler, audioTag, tag, blob);
+          break;
+        }
+        case 1:
+          // Junking the audio chunk itself is the caller's choice, not a
+          // fault of the editor: the audio tag is never passed.
+          editor.MaybeJunkSegment(tag == audioTag ? MakeRIFFType("LIST") : tag);
+          break;
+        case 2:
+          editor.RemoveTrailingMetaData(audioTag);
+          CheckAudioKept(scratch, original, region, endian, handler, audioTag);
+          break;
+        case 3:
+          // Known: the FORM handler has no identifiers, so this would turn
+          // every chunk, the audio chunk included, into junk at the next
+          // AddChunkData. Only the WAVE handler's files are given it.
+          if (!form) editor.UpdateUUIDsFromTags();
+          break;
+      }
+    } catch (const TarnError& e) {
+      if (trace) std::fprintf(stderr, "  threw %d\n", e.GetIntErrorCode());
+      // A refused or failed edit must still leave the audio alone.
+      CheckAudioKept(scratch, original, region, endian, handler, audioTag);
+      // Known: an AddChunkData that fails half-way leaves the editor's list
+      // out of step with the file (moved chunks at their new offsets, cut
+      // ones still listed), and a retry on the same editor moves chunks by
+      // those stale offsets, over the audio payload. Editing stops here.
+      if ((op & 3) == 0) break;
+    }
+  }
+}
+
+}  // namespace
+}  // namespace tarn
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  using namespace tarn;
+  if (size > kMaxInput) return -1;  // -1: not added to the corpus
+  Scratch& scratch = GetScratch();
+  WriteBytes(scratch.original, data, size);
+  const Bytes original(data, data + size);
+  const FileSpecification spec = SpecOf(scratch.original);
+  (void)ListAndQuery(spec, kRIFFLittleEndian, GetWaveRIFFFormatHandler(), kDataTag, original);
+  (void)ListAndQuery(spec, kRIFFBigEndian, GetAIFFRIFFFormatHandler(), kSoundTag, original);
+  EditCopy(data, size, original);
+  return 0;
+}
