@@ -34,7 +34,7 @@ run_preset() {
   cmake --build --preset "$p" -j "$jobs" || return 1
   if [ "$p" = mingw ]; then
     . scripts/wine-env.sh
-    tarn_wine_start
+    tarn_wine_start || return 1
     trap tarn_wine_stop EXIT
   fi
   ctest --preset "$p" -j "$jobs" || return 1

@@ -5,8 +5,9 @@
 # instead of CTest's pipe, so it cannot keep the test open after the program
 # has finished.
 . "$(dirname "$0")/wine-env.sh"
+[ -n "$TARN_WINE" ] || exit 127
 out=$(mktemp)
-/usr/lib/wine/wine64 "$@" >"$out" 2>&1
+"$TARN_WINE" "$@" >"$out" 2>&1
 rc=$?
 cat "$out"
 rm -f "$out"
