@@ -452,6 +452,17 @@ TEST_P(EveryStream, TextReadersStopAtTheirTerminators) {
   EXPECT_EQ(ReadText(in, Line()).code, CStream::kLineTooLong);
 }
 
+// Pointers come back within the process; a file keeps 8 zero bytes instead.
+TEST_P(EveryStream, PointersComeBackExceptFromFiles) {
+  test::Channel channel(GetParam());
+  int x = 0;
+  channel.Out().PutPointer(&x);
+  channel.Out().PutShort(7);
+  CStream& in = channel.In();
+  EXPECT_EQ(in.GetPointer(), std::string(GetParam()).starts_with("File") ? nullptr : &x);
+  EXPECT_EQ(in.GetShort(), 7);
+}
+
 INSTANTIATE_TEST_SUITE_P(Kinds, EveryStream, ::testing::ValuesIn(test::kChannelKinds),
                          [](const auto& info) { return std::string(info.param); });
 
@@ -534,6 +545,33 @@ TEST(CFileStream, SixtyFourBitPositions) {
   s.Truncate(0);
 }
 
+// Buffer sizes changed between writes and reads, on a file and on a handle,
+// never lose or reorder a byte; reopening starts again at 0.
+TEST(CBufferedStream, ResizingTheBufferMidStreamKeepsTheData) {
+  test::TempPath path("resize");
+  CFileStream file(4);
+  file.Open(File(path.Spec()).Open("w+b"), kTCLReadWriteMode);
+  CHandleStream handle(kTCLReadWriteMode);
+  const int sizes[] = {1, 3, 64, 2, 5};
+  for (CBufferedStream* s : std::initializer_list<CBufferedStream*>{&file, &handle}) {
+    for (int i = 0; i < 40; ++i) {
+      s->PutShort(static_cast<short>(i * 257));
+      if (i % 5 == 0) s->SetBufferSize(sizes[i / 5 % 5]);
+    }
+    EXPECT_EQ(CodeOf([&] { s->SetBufferSize(0); }), s == &file ? -50 : 0);
+    s == &file ? file.Open(kTCLReadMode) : (handle.Close(), handle.Open(kTCLReadMode));
+    EXPECT_EQ(s->Position(), 0);
+    for (int i = 0; i < 40; ++i) {
+      ASSERT_EQ(s->GetShort(), static_cast<short>(i * 257)) << i;
+      if (i % 5 == 2) s->SetBufferSize(sizes[i / 5 % 5]);
+    }
+    EXPECT_TRUE(s->AtEnd());
+  }
+  EXPECT_EQ(CodeOf([&] { handle.SetBlockSize(0); }), -50);
+  handle.DisposeAll();
+  EXPECT_EQ(CodeOf([&] { (void)handle.GetShort(); }), -38) << "closed";
+}
+
 TEST(CHandleStream, GrowsTrimsAndTruncatesWithZerosInTheCallersHandle) {
   auto_handle<char> h(NewHandle(4));
   std::memcpy(h.data(), "\0\0\0\x2A", 4);
@@ -547,6 +585,22 @@ TEST(CHandleStream, GrowsTrimsAndTruncatesWithZerosInTheCallersHandle) {
     s.Truncate(9);
   }
   EXPECT_EQ(Bytes(h.data(), h.data() + h.size()), Hex("0000002A 0000 000000")) << "zeros";
+}
+
+TEST(PtrStream, TruncatesAndReopensAtZero) {
+  const unsigned char area[6] = {1, 2, 3, 4, 5, 6};
+  PtrStream s(PtrStream::ReadOnly{}, area, 6);
+  s.MoveTo(5);
+  s.Truncate(8);
+  EXPECT_EQ(s.Size(), 6);
+  EXPECT_EQ(s.Position(), 5);
+  s.Truncate(3);
+  EXPECT_EQ(s.Size(), 3);
+  EXPECT_EQ(s.Position(), 3);
+  s.Open(kTCLReadMode);
+  EXPECT_EQ(s.GetShort(), 0x0102);
+  EXPECT_EQ(s.GetShort(), 0) << "one byte left";
+  EXPECT_EQ(s.GetChar(), 3);
 }
 
 TEST(PtrStream, IgnoresWhatDoesNotFit) {
