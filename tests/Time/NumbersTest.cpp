@@ -38,6 +38,11 @@ TEST(SampleCount, WrapsTruncatesAndPinsAgainstWideReference) {
   n += SampleCountFrac(-1.9);
   n /= SampleCountFrac(3.7);
   EXPECT_EQ(n, 6);  // operands truncated first: 10*2, -1, /3
+  n -= SampleCountFrac(2.9);
+  EXPECT_EQ(n++, 4);
+  EXPECT_EQ(n--, 5);
+  EXPECT_EQ(n, 4);
+  EXPECT_EQ(SampleCountFrac(-2.5).Abs(), 2.5);
   EXPECT_EQ(SampleCount(7).GetSInt32PinningToRange(10, 5), 5);  // max test first
   const std::int64_t edges[] = {kMin64, kMin64 + 1, std::int64_t{kMin32} - 1, kMin32,     -1,    0,
                                 1,      kMax32,     std::int64_t{kMax32} + 1, kMax64 - 1, kMax64};
@@ -114,6 +119,18 @@ TEST(TickAndFrac, ConstructionRoundingAndWrappingArithmetic) {
   EXPECT_EQ((AssembleTick(kMax32, 0xFFFFFFFFu) + Tick(Tick::Epsilon())).AsLongLong(), kMin64);
   EXPECT_EQ((Tick(-7) % Tick(2)).AsLongLong(), -kTwo32);
   EXPECT_EQ((Tick(Tick::Max()) * 4.0).AsLongLong(), kMin64);  // not pinned
+  const auto wrapped = [](std::int64_t a, std::int64_t b) {
+    return static_cast<std::int64_t>(static_cast<std::uint64_t>(a) * static_cast<std::uint64_t>(b));
+  };
+  for (std::int64_t raw :
+       {kMin64, -3 * kTwo32 - 5, std::int64_t{-1}, std::int64_t{0}, kTwo32 + 7, kMax64}) {
+    const Tick t = AssembleTick(static_cast<int>(raw >> 32), static_cast<std::uint32_t>(raw));
+    EXPECT_EQ((-t).AsLongLong(), wrapped(raw, -1)) << raw;
+    EXPECT_EQ((t * 3).AsLongLong(), wrapped(raw, 3)) << raw;
+    EXPECT_EQ((t * std::int64_t{-kTwo32}).AsLongLong(), wrapped(raw, -kTwo32)) << raw;
+    EXPECT_EQ((t / std::int64_t{3}).AsLongLong(), raw / 3) << raw;
+    EXPECT_EQ(t / Tick(-2), raw / (-2 * kTwo32)) << raw;
+  }
 }
 
 std::int64_t Tocks(const Frac<kD>& f) {
