@@ -10,7 +10,7 @@ packages=(
   g++-mingw-w64-x86-64-posix wine64
   libsndfile1-dev sndfile-programs sox ffmpeg
   libboost-dev libmimalloc-dev libjemalloc-dev libgoogle-perftools-dev
-  clang-format libclang-rt-14-dev mediainfo
+  clang-format libclang-rt-14-dev mediainfo gcovr
 )
 
 missing=()

@@ -43,7 +43,9 @@ class CBufferedStream : public CStream {
   // Stops at the end of the data without failing.
   int GetThruN(void* buffer, char terminator, int max) override;
 
-  // Resizes the buffer (or allocates it); only while it holds no bytes.
+  // Resizes the buffer (or allocates it); a size of 0 or less fails with -50.
+  // Changed bytes it holds are first written out and the buffer re-centred
+  // on the current position, so position and contents stay as they were.
   virtual void SetBufferSize(int size);
   // Loads the bytes that follow the buffer; the base version fails with -39
   // when nothing could be loaded.

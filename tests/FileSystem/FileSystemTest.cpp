@@ -164,7 +164,12 @@ TEST_F(FileSystemTest, NonASCIINamesRoundTrip) {
 }
 
 TEST_F(FileSystemTest, ModificationDateRoundTrips) {
+  const FileDate now = FileDate::Now();
   const File f = File::CreateOnDisk(In(U("dated.wav")), "WAVE", 0);
+  EXPECT_LT(now.GetNanoseconds(), 1'000'000'000u);
+  EXPECT_NEAR(static_cast<double>(f.GetModificationDate().GetSeconds()),
+              static_cast<double>(now.GetSeconds()), 5.0)
+      << "a new file is dated now";
   for (const FileDate& d : {FileDate(1'600'000'000, 123'456'700), FileDate(0, 0),
                             FileDate(4'102'444'800, 999'999'900)}) {  // 2100-01-01
     f.SetModificationDate(d);
@@ -183,6 +188,7 @@ TEST_F(FileSystemTest, ResourceForkIsSeparateFromDataAndTravelsWithTheFile) {
   WriteAll(f.OpenResourceFork(tarn::kWritePermission), "RSRC");
   EXPECT_EQ(f.GetFileDataSize(), 6);
   EXPECT_EQ(f.GetFileResourceSize(), 4);
+  EXPECT_EQ(f.GetFileTotalSize(), 10);
   EXPECT_EQ(File::ResourceForkPath(f.GetSpecification().GetFullPath()),
             f.GetSpecification().GetFullPath() + U(":AFP_Resource"));
   f.Rename(U("renamed.sd2"));
@@ -246,6 +252,9 @@ TEST(FileTypes, TypeToExtensionsStopsAtFirstRow) {
     std::vector<tarn::UString> list{U("stale")};
     EXPECT_EQ(tarn::FileTypeToExtensionList(row.type, list), !row.extensions.empty());
     EXPECT_EQ(list, row.extensions);
+    tarn::UString first = U("stale");
+    EXPECT_EQ(tarn::FileTypeToExtension(row.type, first), !row.extensions.empty());
+    EXPECT_EQ(first, row.extensions.empty() ? tarn::UString() : row.extensions.front());
   }
 }
 
@@ -258,6 +267,9 @@ TEST(FileTypes, RegisteredTypesAreSearchedFirst) {
   EXPECT_TRUE(tarn::ExtensionToFileType(U("TMIX"), type));
   EXPECT_EQ(type, FileTypeClass("Rgs1"));
   EXPECT_EQ(tarn::FileTypeFromName(U("x.Zqx")), FileTypeClass("Rgs1"));
+  std::vector<tarn::UString> list;
+  EXPECT_TRUE(tarn::FileTypeToExtensionList("Rgs1", list));
+  EXPECT_EQ(list, (std::vector<tarn::UString>{U("zqx"), U("tmix")}));
 }
 
 }  // namespace

@@ -1,9 +1,12 @@
 // Standard-string operations, the search family, the stream proxy and ParamUString.
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <sstream>
 #include <stdexcept>
 #include <unordered_map>
+#include <utility>
+#include <vector>
 
 #include "String/StringTestUtil.h"
 #include "tarn/String/ParamUString.h"
@@ -33,6 +36,81 @@ TEST(UStringOps, ConstructAppendAndEdit) {
   EXPECT_THROW((void)s.substr(6), std::out_of_range);
   EXPECT_THROW(s.insert(9, UString("x")), std::out_of_range);
   EXPECT_THROW(UString(s, 6), std::out_of_range);
+}
+
+// Every way in of the same text, a, e acute and a character outside the
+// basic plane (a surrogate pair), gives the same units; null pointers read as
+// nothing.
+TEST(UStringOps, EveryFormOfTheSameTextIsEqual) {
+  const UString text("a\xC3\xA9\xF0\x9D\x84\x9E");
+  const char* utf8 = "a\xC3\xA9\xF0\x9D\x84\x9E";
+  const auto* bytes = reinterpret_cast<const unsigned char*>(utf8);
+  const unsigned char pascal[] = {7, 'a', 0xC3, 0xA9, 0xF0, 0x9D, 0x84, 0x9E};
+  const Unit utf16[] = {'a', 0xE9, 0xD834, 0xDD1E, 0};
+  const UTF16String u16(utf16);
+  const UTF32String u32{'a', 0xE9, 0x1D11E};
+  const wchar_t* wide = L"a\u00E9\U0001D11E";
+  const Unit* const noUnits = nullptr;
+  const std::vector<std::pair<const char*, std::function<UString()>>> forms = {
+      {"unsigned bytes", [&] { return UString(bytes, 7); }},
+      {"std::string", [&] { return UString(std::string(utf8)); }},
+      {"units", [&] { return UString(utf16); }},
+      {"UTF16String", [&] { return UString(u16); }},
+      {"moved UTF16String", [&] { return UString(UTF16String(u16)); }},
+      {"UTF32String", [&] { return UString(u32); }},
+      {"wide", [&] { return UString(wide); }},
+      {"std::wstring", [&] { return UString(std::wstring(wide)); }},
+      {"= bytes", [&] { return UString() = utf8; }},
+      {"= std::string", [&] { return UString() = std::string(utf8); }},
+      {"= units", [&] { return UString() = utf16; }},
+      {"= UTF16String", [&] { return UString() = u16; }},
+      {"= UTF32String", [&] { return UString() = u32; }},
+      {"= wide", [&] { return UString() = wide; }},
+      {"= std::wstring", [&] { return UString() = std::wstring(wide); }},
+      {"assign part", [&] { return UString().assign(UString("<") + text + UString(">"), 1, 4); }},
+      {"assign Pascal", [&] { return UString().assign(pascal); }},
+      {"append Pascal", [&] { return UString().append(pascal + 1, 1).append(pascal + 2, 6); }},
+      {"append std::string", [&] { return UString("a").append(std::string(utf8 + 1)); }},
+      {"append units", [&] { return UString("a").append(utf16 + 1).append(noUnits); }},
+      {"append counted units", [&] { return UString("a").append(utf16 + 1, 3); }},
+      {"append UTF16String", [&] { return UString("a").append(u16.substr(1)); }},
+      {"append UTF32String", [&] { return UString("a").append(u32.substr(1)); }},
+      {"append wide", [&] { return UString("a").append(wide + 1); }},
+      {"append std::wstring", [&] { return UString("a").append(std::wstring(wide + 1)); }},
+      {"+", [&] { return UString("a\xC3\xA9") + UString(utf16 + 2); }},
+      {"insert units", [&] { return UString("a").insert(1, utf16 + 1); }},
+      {"insert counted units", [&] { return UString("a\xC3\xA9").insert(2, utf16 + 2, 2); }},
+      {"insert at iterator",
+       [&] {
+         UString s("a\xC3\xA9");
+         s.insert(s.end(), Unit{0xD834});
+         return s.insert(3, 1, Unit{0xDD1E});
+       }},
+      {"erase range",
+       [&] {
+         UString s = text + UString("xyz");
+         s.erase(s.begin() + 4, s.end());
+         return s;
+       }},
+      {"replace part",
+       [&] {
+         return UString("a?").replace(1, 1, UString("<\xC3\xA9>"), 1, 1) + UString(utf16 + 2);
+       }},
+      {"replace units", [&] { return UString("a??").replace(1, 2, utf16 + 1, 3); }},
+  };
+  for (const auto& [name, make] : forms)
+    EXPECT_EQ(test::UnitsOf(make()), test::UnitsOf(text)) << name;
+  const std::vector<std::pair<UString, test::Units>> units = {
+      {UString(noUnits), {}},
+      {UString(3, Unit{0xE9}), {0xE9, 0xE9, 0xE9}},
+      {UString('\xE9'), {0xE9}},
+      {UString(Unit{0xD834}), {0xD834}},
+      {UString() = '\xE9', {0xE9}},
+      {UString() = Unit{0xDD1E}, {0xDD1E}},
+      {UString("x").assign(2, Unit{'y'}), {'y', 'y'}},
+      {UString("x").append(static_cast<const unsigned char*>(nullptr)), {'x'}},
+  };
+  for (const auto& [s, expected] : units) EXPECT_EQ(test::UnitsOf(s), expected);
 }
 
 // Narrow arguments are byte-for-unit: 0xE9 finds U+00E9.

@@ -23,6 +23,7 @@ constexpr std::int64_t kMax64 = std::numeric_limits<std::int64_t>::max();
 constexpr std::int32_t kMin32 = std::numeric_limits<std::int32_t>::min();
 constexpr std::int32_t kMax32 = std::numeric_limits<std::int32_t>::max();
 constexpr std::int64_t kTwo32 = std::int64_t{1} << 32;
+constexpr std::uint32_t kMaxU32 = std::numeric_limits<std::uint32_t>::max();
 constexpr int kD = kTocksPerTick;
 
 TEST(SampleCount, WrapsTruncatesAndPinsAgainstWideReference) {
@@ -37,6 +38,11 @@ TEST(SampleCount, WrapsTruncatesAndPinsAgainstWideReference) {
   n += SampleCountFrac(-1.9);
   n /= SampleCountFrac(3.7);
   EXPECT_EQ(n, 6);  // operands truncated first: 10*2, -1, /3
+  n -= SampleCountFrac(2.9);
+  EXPECT_EQ(n++, 4);
+  EXPECT_EQ(n--, 5);
+  EXPECT_EQ(n, 4);
+  EXPECT_EQ(SampleCountFrac(-2.5).Abs(), 2.5);
   EXPECT_EQ(SampleCount(7).GetSInt32PinningToRange(10, 5), 5);  // max test first
   const std::int64_t edges[] = {kMin64, kMin64 + 1, std::int64_t{kMin32} - 1, kMin32,     -1,    0,
                                 1,      kMax32,     std::int64_t{kMax32} + 1, kMax64 - 1, kMax64};
@@ -49,10 +55,16 @@ TEST(SampleCount, WrapsTruncatesAndPinsAgainstWideReference) {
         EXPECT_EQ(SampleCount(av).SubtractWithSInt32Result(b), ref) << av << " - " << b;
         EXPECT_EQ(SampleCount(av).SubtractWithPositiveSInt32Result(b), ref < 0 ? 0 : ref);
         const std::int64_t pinned = av > 100 ? 100 : av < 0 ? 0 : av;
+        const std::int64_t both = av > 100 ? 100 : av < -100 ? -100 : av;
+        const std::int64_t below = av > -10 ? -10 : av < -100 ? -100 : av;
+        const std::int64_t u32 = av < 0 ? 0 : av > kMaxU32 ? kMaxU32 : av;
         EXPECT_EQ(SampleCount(av).CanFitInSInt32(), av >= kMin32 && av <= kMax32) << av;
         EXPECT_EQ(SampleCount(av).GetSInt32PinningToRange(0, 100), pinned) << av;
         EXPECT_EQ(SampleCount(av).GetPositiveSInt32PinningToMax(100), pinned) << av;
         EXPECT_EQ(SampleCount(av).GetUInt32PinningToMax(100u), static_cast<std::uint32_t>(pinned));
+        EXPECT_EQ(SampleCount(av).GetSInt32PinningToRange(-100, 100), both) << av;
+        EXPECT_EQ(SampleCount(av).GetSInt32PinningToRange(-100, -10), below) << av;
+        EXPECT_EQ(SampleCount(av).GetUInt32PinningToMax(kMaxU32), u32) << av;
       }
     }
   }
@@ -60,8 +72,28 @@ TEST(SampleCount, WrapsTruncatesAndPinsAgainstWideReference) {
 
 TEST(TickAndFrac, ConstructionRoundingAndWrappingArithmetic) {
   EXPECT_TRUE(SampleCountFrac(std::nan("")).IsNotANumber());
-  EXPECT_EQ(SampleCountFrac(1e12).GetFloat32AssertingRange(), 16777215.0f);
-  EXPECT_EQ(SampleCountFrac(16777216.0).GetFloat32AssertingRange(), 16777215.0f);
+  const double inf = std::numeric_limits<double>::infinity();
+  constexpr std::int64_t kLimit = 9223372036854774784;  // pinned, then truncated
+  for (int sign : {1, -1}) {                            // every pin has a negative side as well
+    const struct {
+      double in, out;
+    } floats[] = {{inf, 16777215},
+                  {1e12, 16777215},
+                  {16777216, 16777215},
+                  {16777215.5, 16777215},
+                  {16777215, 16777215},
+                  {16777214, 16777214},
+                  {0.5, 0.5}};
+    for (const auto& f : floats) {
+      EXPECT_EQ(SampleCountFrac(sign * f.in).GetFloat32AssertingRange(),
+                static_cast<float>(sign * f.out))
+          << sign * f.in;
+    }
+    EXPECT_EQ(Tick(sign * inf).AsLongLong(), sign * kLimit);
+    EXPECT_EQ(Tick(sign * 1e300).AsLongLong(), sign * kLimit);
+    EXPECT_EQ(Tick(sign * 2147483648.0).AsLongLong(), sign * kLimit);
+    EXPECT_EQ(Tick(sign * 2147483647.5).AsLongLong(), sign * (kMax64 - kMax32)) << "not pinned";
+  }
   EXPECT_EQ(Tick(Tick::Min()).AsLongLong(), static_cast<std::int64_t>(0x8000000100000000ull));
   EXPECT_EQ(Tick(kMin32).AsLongLong(), kMin64);
   for (int shift = 1; shift <= 31; ++shift) {
@@ -70,9 +102,6 @@ TEST(TickAndFrac, ConstructionRoundingAndWrappingArithmetic) {
           << value << " >> " << shift;
     }
   }
-  constexpr std::int64_t kLimit = 9223372036854774784;  // pinned, then truncated
-  EXPECT_EQ(Tick(1e300).AsLongLong(), kLimit);
-  EXPECT_EQ(Tick(2147483648.0).AsLongLong(), kLimit);
   EXPECT_EQ(Tick(std::ldexp(-1.5, -32)).AsLongLong(), -1);
   EXPECT_EQ(Tick(std::nan("")).AsLongLong(), 0);
   for (int quarters = -32; quarters <= 32; ++quarters) {
@@ -90,6 +119,18 @@ TEST(TickAndFrac, ConstructionRoundingAndWrappingArithmetic) {
   EXPECT_EQ((AssembleTick(kMax32, 0xFFFFFFFFu) + Tick(Tick::Epsilon())).AsLongLong(), kMin64);
   EXPECT_EQ((Tick(-7) % Tick(2)).AsLongLong(), -kTwo32);
   EXPECT_EQ((Tick(Tick::Max()) * 4.0).AsLongLong(), kMin64);  // not pinned
+  const auto wrapped = [](std::int64_t a, std::int64_t b) {
+    return static_cast<std::int64_t>(static_cast<std::uint64_t>(a) * static_cast<std::uint64_t>(b));
+  };
+  for (std::int64_t raw :
+       {kMin64, -3 * kTwo32 - 5, std::int64_t{-1}, std::int64_t{0}, kTwo32 + 7, kMax64}) {
+    const Tick t = AssembleTick(static_cast<int>(raw >> 32), static_cast<std::uint32_t>(raw));
+    EXPECT_EQ((-t).AsLongLong(), wrapped(raw, -1)) << raw;
+    EXPECT_EQ((t * 3).AsLongLong(), wrapped(raw, 3)) << raw;
+    EXPECT_EQ((t * std::int64_t{-kTwo32}).AsLongLong(), wrapped(raw, -kTwo32)) << raw;
+    EXPECT_EQ((t / std::int64_t{3}).AsLongLong(), raw / 3) << raw;
+    EXPECT_EQ(t / Tick(-2), raw / (-2 * kTwo32)) << raw;
+  }
 }
 
 std::int64_t Tocks(const Frac<kD>& f) {
@@ -154,11 +195,13 @@ TEST(TockFrac, ArithmeticExhaustiveAgainstReference) {
   EXPECT_EQ(f, TockFrac(4, 3600000));
 }
 
-int ReferencePin(std::int64_t x, std::int64_t y) {
-  if (x == kMax32 || y == kMax32) return kMax32;
-  if (x <= -kMax32 || y <= -kMax32) return -kMax32;
-  const std::int64_t s = x + y;
-  return static_cast<int>(s <= -kMax32 ? -kMax32 : s >= kMax32 ? kMax32 : s);
+// Operands at or past a bound give that bound, the upper one first; other
+// sums are pinned to [-bound, bound].
+std::int64_t ReferencePin(std::int64_t x, std::int64_t y, std::int64_t bound) {
+  if (x >= bound || y >= bound) return bound;
+  if (x <= -bound || y <= -bound) return -bound;
+  const __int128 s = static_cast<__int128>(x) + y;
+  return static_cast<std::int64_t>(s <= -bound ? -bound : s >= bound ? bound : s);
 }
 
 TEST(AddPin, IntTickAndTockFracPinToTheirBounds) {
@@ -168,7 +211,39 @@ TEST(AddPin, IntTickAndTockFracPinToTheirBounds) {
       values.push_back(v);
   }
   for (int x : values) {
-    for (int y : values) ASSERT_EQ(AddPin(x, y), ReferencePin(x, y)) << x << " + " << y;
+    for (int y : values) ASSERT_EQ(AddPin(x, y), ReferencePin(x, y, kMax32)) << x << " + " << y;
+  }
+  // Raw ticks and tocks on both sides of both bounds, and between them.
+  const std::int64_t maxRaw = std::int64_t{kMax32} << 32, maxTocks = std::int64_t{kMax32} * kD;
+  std::vector<Tick> ticks;
+  std::vector<TockFrac> tocks;
+  for (std::int64_t sign : {1, -1}) {
+    for (std::int64_t raw : {kMax64, maxRaw + 1, maxRaw, maxRaw - 1, maxRaw / 2 + 1, maxRaw / 2,
+                             kTwo32, std::int64_t{1}, std::int64_t{0}})
+      ticks.push_back(AssembleTick(static_cast<int>((sign * raw) >> 32),
+                                   static_cast<std::uint32_t>(sign * raw)));
+    ticks.push_back(AssembleTick(kMin32, 0));
+    for (int whole : {kMax32, kMax32 - 1, kMax32 / 2, 1, 0}) {
+      for (int n : {0, 1, kD / 2, kD - 1})
+        tocks.emplace_back(static_cast<int>(sign * whole), static_cast<int>(sign * n));
+    }
+    tocks.emplace_back(kMin32, 0);
+  }
+  for (const Tick x : ticks) {
+    for (const Tick y : ticks) {
+      const Tick sum = AddPin(x, y);
+      ASSERT_EQ(sum.AsLongLong(), ReferencePin(x.AsLongLong(), y.AsLongLong(), maxRaw))
+          << x.AsLongLong() << " + " << y.AsLongLong();
+      ASSERT_TRUE(InClosedInterval(sum, Tick::Min(), Tick::Max()));
+    }
+  }
+  for (const TockFrac& x : tocks) {
+    for (const TockFrac& y : tocks) {
+      const TockFrac sum = AddPin(x, y);
+      ASSERT_EQ(Tocks(sum), ReferencePin(Tocks(x), Tocks(y), maxTocks))
+          << Tocks(x) << " + " << Tocks(y);
+      ASSERT_TRUE(InClosedInterval(sum, TockFrac(-kMax32, 0), TockFrac(kMax32, 0)));
+    }
   }
   const Tick max = Tick::Max(), min = Tick::Min(), eps = Tick::Epsilon();
   EXPECT_EQ(AddPin(min, max), max);

@@ -4,7 +4,9 @@
 
 #include <algorithm>
 #include <array>
+#include <memory>
 #include <random>
+#include <utility>
 #include <vector>
 
 #include "tarn/Errors/TarnError.h"
@@ -92,6 +94,10 @@ TEST(TimeRegion, RandomEditsMatchBitmapReference) {
 
         const std::vector<Range> ranges = RangesOf(region);
         ASSERT_EQ(region.mirror, ranges);
+        const Range bounds = region.Bounds();
+        ASSERT_EQ(
+            std::pair(bounds.start, bounds.end),
+            ranges.empty() ? std::pair(0, 0) : std::pair(ranges.front().start, ranges.back().end));
         for (int t = -2; t < kSlots + 4; ++t) {
           Range found;
           ASSERT_EQ(region.FindIfIncludesTime(t, found), bits[t + 2]) << "t=" << t;
@@ -106,6 +112,14 @@ TEST(TimeRegion, RandomEditsMatchBitmapReference) {
             ASSERT_LE(ranges[i - 1].end + !strict, ranges[i].start);
           }
         }
+      }
+      // Copies keep the ranges and the coalescing rule.
+      const std::unique_ptr<TimeRegion> copy = region.NewTimeRegionCopy();
+      TimeRegion assigned(std::vector<Range>{{1, 2}}, !strict);
+      assigned.InitFromCopy(region);
+      for (const TimeRegion* r : {copy.get(), &assigned}) {
+        ASSERT_EQ(RangesOf(*r), RangesOf(region));
+        ASSERT_EQ(r->IsStrictCoalescing(), strict);
       }
     }
   }
