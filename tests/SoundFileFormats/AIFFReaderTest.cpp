@@ -75,7 +75,10 @@ const Encoding kEncodings[] = {
     {kAIFC, T("in24"), 24, true, kSamp24, 3, false},
     {kAIFC, T("in32"), 32, true, kSampUnpacked24, 4, false},
     {kAIFC, T("fl32"), 32, true, kSampFloat32, 4, false},
-    {kAIFC, T("FL32"), 32, false},
+    {kAIFC, T("FL32"), 32, true, kSampFloat32, 4, false},  // libsndfile's spelling
+    {kAIFC, T("FL64"), 64, true, kSampWide64B, 8, false},
+    {kAIFC, T("Fl32"), 32, false},
+    {kAIFC, T("42n1"), 24, false},  // libsndfile's little-endian 24-bit
     {kAIFC, T("fl64"), 64, true, kSampWide64B, 8, false},
     {kAIFC, T("ulaw"), 8, false},
     {kAIFC, T("ima4"), 16, false},

@@ -5,6 +5,7 @@
 
 #include <array>
 #include <cstdint>
+#include <cstring>
 #include <string>
 #include <vector>
 
@@ -13,14 +14,14 @@
 
 namespace tarn::test {
 
-inline void Put16(Bytes& out, std::uint16_t v) {
-  out.push_back(static_cast<std::uint8_t>(v >> 8));
-  out.push_back(static_cast<std::uint8_t>(v));
+inline void PutBigEndian(Bytes& out, std::uint32_t v, int bytes) {
+  const std::size_t at = out.size();
+  out.resize(at + static_cast<std::size_t>(bytes));
+  for (int i = 0; i < bytes; ++i)
+    out[at + static_cast<std::size_t>(i)] = static_cast<std::uint8_t>(v >> (8 * (bytes - 1 - i)));
 }
-inline void Put32(Bytes& out, std::uint32_t v) {
-  Put16(out, static_cast<std::uint16_t>(v >> 16));
-  Put16(out, static_cast<std::uint16_t>(v));
-}
+inline void Put16(Bytes& out, std::uint16_t v) { PutBigEndian(out, v, 2); }
+inline void Put32(Bytes& out, std::uint32_t v) { PutBigEndian(out, v, 4); }
 inline std::uint32_t Get32(const Bytes& b, std::size_t at) {
   return std::uint32_t{b[at]} << 24 | std::uint32_t{b[at + 1]} << 16 |
          std::uint32_t{b[at + 2]} << 8 | b[at + 3];
@@ -70,6 +71,46 @@ inline std::size_t FindSoundChunk(const Bytes& file) {
     pos += 8 + size + (size & 1);
   }
   return 0;
+}
+
+// Known samples for a file: the bytes as the file holds them, and each
+// sample as a full-scale 32-bit integer (integer encodings) or as a double
+// (floating point), in interleaved order.
+struct Ramp {
+  Bytes bytes;
+  std::vector<std::int32_t> ints;
+  std::vector<double> reals;
+};
+
+inline Ramp MakeRamp(int channels, int frames, int bits, bool lsbFirst, bool floating) {
+  Ramp ramp;
+  const int bytes = bits / 8;
+  for (int k = 0; k < channels * frames; ++k) {
+    std::uint64_t word = 0;
+    if (floating) {
+      // Multiples of 1/256 in [-0.5, 0.5): exact in every format and decoder.
+      const double v = ((k * 37 + 11) % 256 - 128) / 256.0;
+      ramp.reals.push_back(v);
+      if (bits == 32) {
+        const float f = static_cast<float>(v);
+        std::uint32_t u;
+        std::memcpy(&u, &f, 4);
+        word = u;
+      } else {
+        std::memcpy(&word, &v, 8);
+      }
+    } else {
+      const std::uint32_t spread = static_cast<std::uint32_t>(k) * 2654435761u + 977u;
+      const std::uint32_t top = spread & (bits == 32 ? 0xFFFFFFFFu : ~(0xFFFFFFFFu >> bits));
+      ramp.ints.push_back(static_cast<std::int32_t>(top));
+      word = top >> (32 - bits);
+    }
+    for (int i = 0; i < bytes; ++i) {
+      const int shift = lsbFirst ? 8 * i : 8 * (bytes - 1 - i);
+      ramp.bytes.push_back(static_cast<std::uint8_t>(word >> shift));
+    }
+  }
+  return ramp;
 }
 
 }  // namespace tarn::test

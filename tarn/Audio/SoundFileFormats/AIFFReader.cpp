@@ -146,9 +146,9 @@ void AIFFReader::ReadCommonChunk(RIFFType formType, std::int64_t chunkSize) {
     }
   } else if (compression_ == kIn32) {
     format_ = kSampUnpacked24;
-  } else if (compression_ == kFl32) {
+  } else if (compression_ == kFl32 || compression_ == kFL32) {
     format_ = kSampFloat32;
-  } else if (compression_ == kFl64) {
+  } else if (compression_ == kFl64 || compression_ == kFL64) {
     format_ = kSampWide64B;
   } else if (compression_ == kIn24) {
     format_ = kSamp24;

@@ -19,7 +19,9 @@
 //     4 -> kSampUnpacked24, 8 -> kSampWide64A; other sizes fail;
 //   "AIFC" with "in24" -> kSamp24, "in32" -> kSampUnpacked24, "fl32" ->
 //     kSampFloat32, "fl64" -> kSampWide64B, "sowt" or "twos" -> kSamp16
-//     whatever the sample size; any other compression fails.
+//     whatever the sample size; any other compression fails, except that
+//     "FL32" and "FL64", the spellings libsndfile writes for the same
+//     floating-point samples, read as "fl32" and "fl64".
 //   Samples are least significant byte first exactly when the compression
 //   is "sowt". The frame size stays channels * (bits / 8), so a 24-bit
 //   "sowt" file reads as 16-bit samples in 3-byte slots: readers that want
@@ -80,6 +82,8 @@ class AIFFReader {
   static constexpr RIFFType kIn32 = MakeRIFFType("in32");
   static constexpr RIFFType kFl32 = MakeRIFFType("fl32");
   static constexpr RIFFType kFl64 = MakeRIFFType("fl64");
+  static constexpr RIFFType kFL32 = MakeRIFFType("FL32");
+  static constexpr RIFFType kFL64 = MakeRIFFType("FL64");
 
   // Bytes of the "COMM" fields read (18; 22 with an AIFC compression type).
   static constexpr int kCommonSize = 18;
