@@ -1,7 +1,9 @@
-// The makers of the WAVE and AIFF format objects. Until those formats are
+// The makers of the WAVE and AIFF format objects. Until the WAVE format is
 // part of the library, making one fails with the cache's "unsupported"
 // error.
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatMakers.h"
+
+#include "tarn/Audio/SoundFileFormats/AIFFSoundFileFormat.h"
 
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatFailImpl.h"
@@ -14,8 +16,7 @@ std::shared_ptr<SoundFileFormat> MakeWAVEFormat(const FileSpecification& file) {
 }
 
 std::shared_ptr<SoundFileFormat> MakeAIFFFormat(const FileSpecification& file) {
-  FailWithText("SoundFileFormatCache", SoundFileFormatCache::kUnsupportedFormatErr,
-               "the AIFF format is not available", file);
+  return std::make_shared<AIFFSoundFileFormat>(file);
 }
 
 }  // namespace tarn::sffimpl
