@@ -1,10 +1,17 @@
 // The readers' part of the probes: whether the WAVE and AIFF readers parse
-// a file. Until those readers are part of the library, no file parses.
+// a file. Until the AIFF reader is part of the library, no AIFF file parses.
 #include "tarn/Audio/SoundFileFormats/SoundFileProbes.h"
+#include "tarn/Audio/SoundFileFormats/WAVEReader.h"
 
 namespace tarn {
 
-bool WAVEReaderCanParse(const FileSpecification&) noexcept { return false; }
+bool WAVEReaderCanParse(const FileSpecification& file) noexcept {
+  try {
+    return WAVEReader(file).CanParse();
+  } catch (...) {
+    return false;
+  }
+}
 
 bool AIFFReaderCanParse(const FileSpecification&) noexcept { return false; }
 

@@ -134,6 +134,7 @@ std::vector<std::uint8_t> WAVEWriter::MakeFormatChunkPayload(double sampleRate,
 }
 
 std::int64_t WAVEWriter::GetOffsetToSoundDataHeader() const noexcept {
+  if (dataHeaderOffset_) return *dataHeaderOffset_;
   return ComputeStandardOffsetToSoundDataHeader(recIndicator_, wave64_, true, numChannels_);
 }
 
@@ -196,10 +197,11 @@ void WAVEWriter::WriteHeader(std::uint32_t recIndicatorValue, std::int64_t numFr
 
 void WAVEWriter::UpdateDataLength(std::int64_t numFrames) {
   numFrames_ = numFrames;
+  const std::int64_t end = std::max(ComputeFileSize(), stream_->Size());
   if (wave64_) {
-    Put(0, MakeChunkHeader(kRIFFTag, static_cast<std::uint64_t>(ComputeFileSize()) - 24, true));
+    Put(0, MakeChunkHeader(kRIFFTag, static_cast<std::uint64_t>(end) - 24, true));
   } else {
-    Put(0, MakeChunkHeader(kRIFFTag, Clamp32(ComputeFileSize() - 8), false));
+    Put(0, MakeChunkHeader(kRIFFTag, Clamp32(end - 8), false));
   }
   WriteSoundDataHeader(GetOffsetToSoundDataHeader());
 }

@@ -85,8 +85,9 @@ class WAVEWriter {
   // `recIndicatorValue`) and leaves the stream at the first audio byte.
   void WriteHeader(std::uint32_t recIndicatorValue, std::int64_t numFrames);
   // Rewrites the container size and the "data" header for `numFrames`;
-  // nothing else is touched. RIFF sizes beyond 32 bits are stored as
-  // 0xFFFFFFFF.
+  // nothing else is touched. The container size covers the audio and
+  // whatever the file holds after it (the larger of the two ends). RIFF
+  // sizes beyond 32 bits are stored as 0xFFFFFFFF.
   void UpdateDataLength(std::int64_t numFrames);
   // Zero bytes after the audio up to the padding unit of the mode.
   void MaybePadChunk();
@@ -100,6 +101,9 @@ class WAVEWriter {
   void WriteSoundDataHeader(std::int64_t offset);
   // Writes back buffered bytes and closes the file; throws on write errors.
   void Close();
+  // For a file laid out by another writer: where its "data" header is
+  // (the standard offset of this layout otherwise).
+  void SetOffsetToSoundDataHeader(std::int64_t offset) noexcept { dataHeaderOffset_ = offset; }
 
   [[nodiscard]] bool IsWave64() const noexcept { return wave64_; }
   [[nodiscard]] std::int64_t GetOffsetToSoundDataHeader() const noexcept;
@@ -187,6 +191,7 @@ class WAVEWriter {
   bool recIndicator_;
   bool wave64_;
   std::optional<BWFBroadcastWaveExtension> bext_;
+  std::optional<std::int64_t> dataHeaderOffset_;
 };
 
 }  // namespace tarn
