@@ -10,6 +10,8 @@
 #include "tarn/Audio/SoundFileFormats/AIFFSoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileProbes.h"
+#include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"
+#include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
 
 namespace tarn::test {
 namespace {
@@ -25,8 +27,39 @@ class FormatWiring : public ::testing::Test {
                                      {MakeRIFFType("SSND"), Ssnd(0, audio)}}));
     return path;
   }
+  // A new 16-bit stereo recording of 25 frames, RIFF or Wave64.
+  std::filesystem::path MakeWAVE(bool wave64, const char* name) {
+    const auto path = dir_.Path(name);
+    {
+      WAVEWriter writer(SpecOf(path), 44100.0, 2, 2, 25, 4, kSamp16, false, wave64);
+      writer.WriteHeader(1, 25);
+    }
+    std::filesystem::resize_file(path, std::filesystem::file_size(path) + 4 * 25);
+    return path;
+  }
   TempDir dir_;
 };
+
+TEST_F(FormatWiring, WAVEFilesProbeByTypeAndNameAndGetTheWAVEFormatForAllSixTypes) {
+  for (const bool wave64 : {false, true}) {
+    SCOPED_TRACE(wave64);
+    const auto path = MakeWAVE(wave64, wave64 ? "take.w64" : "take.wav");
+    const auto spec = SpecOf(path);
+    EXPECT_TRUE(ProbeWAVEFile(spec));
+    for (const char* type : {"WAVE", ".W64", ".WAV", ".wav", "PNRA", "TEXT"}) {
+      EXPECT_TRUE(ProbeWAVEFile(spec, RIFFTypeFromChars(type))) << type;
+      auto f = SoundFileFormatCache::Instance().MakeFormatForFile(spec, RIFFTypeFromChars(type));
+      ASSERT_NE(dynamic_cast<WAVESoundFileFormat*>(f.get()), nullptr) << type;
+      EXPECT_EQ(f->GetLengthInFrames(), SampleCount(25)) << type;
+    }
+    EXPECT_FALSE(ProbeFileOfType(spec, MakeRIFFType("AIFF")));
+    // The same bytes under a name whose extension is spelt in mixed case.
+    const auto mixed = dir_.Path(wave64 ? "take2.W64x" : "take2.Wav");
+    std::filesystem::copy_file(path, mixed);
+    EXPECT_FALSE(ProbeWAVEFile(SpecOf(mixed), MakeRIFFType("TEXT")));
+    EXPECT_TRUE(ProbeWAVEFile(SpecOf(mixed), MakeRIFFType("WAVE")));
+  }
+}
 
 TEST_F(FormatWiring, AIFFFilesProbeTrueAndGetTheAIFFFormatForBothOfItsTypes) {
   const auto path = MakeAIFF(MakeRIFFType("AIFF"), "take.aif");
