@@ -208,6 +208,25 @@ TEST_F(WAVEReaderFiles, FrameCountIsClampedToTheFile) {
   }
 }
 
+TEST_F(WAVEReaderFiles, ZeroBytesAfterAnEmptyDataChunkEndTheWalk) {
+  for (const Container c : {Container::kRIFF, Container::kWave64}) {
+    SCOPED_TRACE(NameOf(c));
+    Bytes file = FileImage({{kFmt, Fmt(1, 1, 8000, 16)}, {kData, {}}}, c);
+    file.resize(file.size() + (1 << 20));  // a crashed recording of silence
+    auto& r = OpenBytes(file);
+    ASSERT_TRUE(r.CanParse());
+    EXPECT_EQ(r.GetChunks().size(), 2u);
+    EXPECT_EQ(r.GetNumberOfFrames(), 0);
+  }
+  // Thousands of tiny chunks: the walk gives up quietly.
+  std::vector<ChunkSpec> many{{kFmt, Fmt(1, 1, 8000, 16)}};
+  for (int i = 0; i < 5000; ++i) many.push_back({MakeRIFFType("tiny"), {}});
+  many.push_back({kData, Bytes(2)});
+  auto& r = Open(many);
+  EXPECT_FALSE(r.CanParse());
+  EXPECT_EQ(ErrorOf([&] { (void)r.GetHeaderSize(); })->GetIntErrorCode(), WAVEReader::kNoDataChunk);
+}
+
 TEST_F(WAVEReaderFiles, MetadataAfterTheAudioIsFoundAndOddAudioIsNotOverCounted) {
   BWFBroadcastWaveExtension bext;
   bext.mDescription = "after";

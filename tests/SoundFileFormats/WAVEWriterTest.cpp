@@ -194,7 +194,7 @@ TEST(WAVEWriterFile, UpdateDataLengthRewritesOnlyTheSizesAndPadsTheAudio) {
     writer.MaybePadChunk();
     writer.Close();
     const Bytes file = ReadFile(path);
-    ASSERT_EQ(file.size(), wave64 ? 992u + 16 : 992u + 14);
+    ASSERT_EQ(file.size(), wave64 ? 992u + 13 : 992u + 14);
     EXPECT_EQ(Bytes(file.begin() + 992, file.begin() + 1005), audio);
     EXPECT_TRUE(std::all_of(file.begin() + 1005, file.end(), [](auto b) { return b == 0; }));
     if (wave64) {
@@ -204,6 +204,13 @@ TEST(WAVEWriterFile, UpdateDataLengthRewritesOnlyTheSizesAndPadsTheAudio) {
       EXPECT_EQ(Bytes(file.begin() + 4, file.begin() + 8), LE(992 + 13 - 8, 4));
       EXPECT_EQ(Bytes(file.begin() + 984, file.begin() + 992), Cat({Text("data"), LE(13, 4)}));
     }
+    // The file's end padded to the mode's unit (before a chunk goes behind).
+    {
+      WAVEWriter again(SpecOf(path), 44100.0, 1, 1, 13, 1, kSamp8Offset, false, wave64);
+      again.MaybePadTrailingChunk();
+      again.Close();
+    }
+    EXPECT_EQ(ReadFile(path).size(), wave64 ? 992u + 16 : 992u + 14);
   }
 }
 

@@ -33,6 +33,9 @@ constexpr std::size_t kMinimumExtensibleFormat = 38;
 constexpr std::size_t kStrcHeaderSize = 28;
 constexpr std::size_t kStrcEntrySize = 36;
 constexpr float kMinimumFramesPerBeat = 20.0f;
+// The walk ends quietly after this many chunks (audio bytes behind a "data"
+// chunk of size 0 can look like an endless run of tiny chunks).
+constexpr std::size_t kMaxChunks = 4096;
 
 bool IsJunk(RIFFType tag) {
   return tag == kJunkTag || tag == MakeRIFFType("junk") || tag == MakeRIFFType("PAD ") ||
@@ -113,7 +116,7 @@ void WAVEReader::WalkChunks(CFileStream& stream) {
   std::int64_t position =
       WAVEWriter::GetChunkHeaderSize(wave64_) + WAVEWriter::GetRIFFChunkExtraSize(wave64_);
   auto& handler = GetWaveRIFFFormatHandler();
-  while (position + headerSize <= fileLength_) {
+  while (position + headerSize <= fileLength_ && chunks_.size() < kMaxChunks) {
     std::uint8_t header[24];
     stream.MoveTo(position);
     stream.GetRawDataFromStream(header, headerSize);
@@ -123,6 +126,7 @@ void WAVEReader::WalkChunks(CFileStream& stream) {
     if (wave64_) {
       TarnCOM::UUIDBytes id{};
       std::copy(header, header + 16, id.bytes);
+      if (UUIDObj(id).IsClear()) break;  // zeros: no chunk here
       chunk.tag = handler.TagForUUID(UUIDObj(id));
       length = le::Load64(header + 16);
       if (length < 24) break;
@@ -130,6 +134,7 @@ void WAVEReader::WalkChunks(CFileStream& stream) {
     } else {
       chunk.tag = RIFFTypeFromChars(reinterpret_cast<const char*>(header));
       length = le::Load32(header + 4);
+      if (chunk.tag == 0) break;  // zeros: no chunk here
     }
     const std::int64_t payload = position + headerSize;
     const auto available = static_cast<std::uint64_t>(fileLength_ - payload);

@@ -8,8 +8,9 @@
 // "Rec!"), each bounded by the bytes the file really has. The walk goes on
 // after "data" so that metadata behind the audio is found too; a chunk
 // header that is cut short, or a non-audio chunk whose size passes the end
-// of the file, ends the walk quietly. A "data" chunk whose size passes the
-// end of the file is taken as running to the end.
+// of the file, a null tag (zero bytes), or more than 4096 chunks, ends the
+// walk quietly. A "data" chunk whose size passes the end of the file is
+// taken as running to the end.
 //
 // Rules of interpretation:
 //   - "fmt ": format tags 1 (integer PCM), 3 (IEEE float) and 0xFFFE

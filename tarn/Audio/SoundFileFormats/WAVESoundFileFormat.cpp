@@ -34,7 +34,6 @@ constexpr RIFFType kJunkTag = MakeRIFFType("JUNK");
 constexpr std::size_t kSmplHeaderSize = 36;
 constexpr std::size_t kSmplLoopSize = 24;
 constexpr std::size_t kCuePointSize = 24;
-constexpr std::size_t kAcidSize = 24;
 
 using Bytes = std::vector<std::uint8_t>;
 

@@ -206,7 +206,9 @@ void WAVEWriter::UpdateDataLength(std::int64_t numFrames) {
   WriteSoundDataHeader(GetOffsetToSoundDataHeader());
 }
 
-void WAVEWriter::MaybePadChunk() { PadTo(ComputeFileSize()); }
+void WAVEWriter::MaybePadChunk() {
+  if (!wave64_) PadTo(ComputeFileSize());
+}
 
 void WAVEWriter::MaybePadTrailingChunk() { PadTo(stream_->Size()); }
 

@@ -89,7 +89,10 @@ class WAVEWriter {
   // whatever the file holds after it (the larger of the two ends). RIFF
   // sizes beyond 32 bits are stored as 0xFFFFFFFF.
   void UpdateDataLength(std::int64_t numFrames);
-  // Zero bytes after the audio up to the padding unit of the mode.
+  // In RIFF, the pad byte after odd audio. A Wave64 file whose audio
+  // chunk is the last is left unpadded: other programs count zero bytes
+  // after the audio as samples (the chunk editor pads the file before it
+  // appends a chunk behind the audio).
   void MaybePadChunk();
   // Zero bytes at the end of the file up to the padding unit of the mode.
   void MaybePadTrailingChunk();
