@@ -290,6 +290,21 @@ TEST(SoundFileFormatMetaData, FlushReportsFailuresAndReleaseSwallowsThem) {
   EXPECT_EQ(f.log.back(), "close");
 }
 
+TEST(SoundFileFormatMetaData, HooksMayAskTheMetaDataQueriesOfTheirFormat) {
+  FakeSoundFileFormat f(FileSpecification(UString("/nowhere/x.wav")));
+  bool openDuringWrite = false;
+  f.onWrite = [&] {
+    openDuringWrite = f.MetaDataIsOpen();
+    f.DontSetModDateBackOnMetaDataClose();
+    return false;
+  };
+  auto rw = f.GetReadWriteMetaDataAccess();
+  rw->Flush();
+  EXPECT_TRUE(openDuringWrite);
+  rw.reset();
+  EXPECT_FALSE(f.MetaDataIsOpen());
+}
+
 TEST(SoundFileFormatMetaData, AFailedOpenMakesNoHandle) {
   FakeSoundFileFormat f(FileSpecification(UString("/nowhere/x.wav")));
   f.failOpen = true;

@@ -1,18 +1,13 @@
-// The makers of the WAVE and AIFF format objects. Until the WAVE format is
-// part of the library, making one fails with the cache's "unsupported"
-// error.
+// The makers of the WAVE and AIFF format objects.
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatMakers.h"
 
 #include "tarn/Audio/SoundFileFormats/AIFFSoundFileFormat.h"
-
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatFailImpl.h"
+#include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"
 
 namespace tarn::sffimpl {
 
 std::shared_ptr<SoundFileFormat> MakeWAVEFormat(const FileSpecification& file) {
-  FailWithText("SoundFileFormatCache", SoundFileFormatCache::kUnsupportedFormatErr,
-               "the WAVE format is not available", file);
+  return std::make_shared<WAVESoundFileFormat>(file);
 }
 
 std::shared_ptr<SoundFileFormat> MakeAIFFFormat(const FileSpecification& file) {
