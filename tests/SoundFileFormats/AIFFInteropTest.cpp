@@ -11,6 +11,7 @@
 // attributes written and decode to the very samples written.
 
 #include <algorithm>
+#include <cctype>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>

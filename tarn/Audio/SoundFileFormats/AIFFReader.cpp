@@ -4,6 +4,7 @@
 #include <array>
 
 #include "tarn/Audio/SoundFileFormats/IEEEExtended.h"
+#include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
 #include "tarn/Errors/Fail.h"
 #include "tarn/Streams/CFileStream.h"
 
@@ -108,7 +109,7 @@ AIFFReader::Chunk AIFFReader::ReadChunkHeader() {
   std::uint8_t header[8];
   stream_->GetRawDataFromStream(header, 8);
   const std::int64_t size = U32(header + 4);
-  return {U32(header), size + (size & 1), size};
+  return {U32(header), WAVEWriter::PadDataLength(size, false), size};
 }
 
 void AIFFReader::ReadCommonChunk(RIFFType formType, std::int64_t chunkSize) {

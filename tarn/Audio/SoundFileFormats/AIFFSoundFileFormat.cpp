@@ -8,6 +8,7 @@
 
 #include "tarn/Audio/SoundFileFormats/AIFFWriter.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
+#include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
 #include "tarn/Errors/Fail.h"
 #include "tarn/Streams/CFileStream.h"
 
@@ -254,7 +255,7 @@ void AIFFSoundFileFormat::AdjustLengthInHeader(const SoundFileAttributes&, Sampl
   if (frameSize < 1 || n < 0 || n > kMaxU32 || start + n * frameSize + 1 > kMaxU32)
     FailOSErr(kParamErr);
   const std::int64_t end = start + n * frameSize;
-  const std::int64_t paddedEnd = end + (end & 1);
+  const std::int64_t paddedEnd = WAVEWriter::PadDataLength(end, false);
 
   // Where the chunks after the audio begin (none when the audio runs to
   // the end of the file).

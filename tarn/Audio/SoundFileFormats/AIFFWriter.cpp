@@ -4,6 +4,7 @@
 #include <string_view>
 
 #include "tarn/Audio/SoundFileFormats/IEEEExtended.h"
+#include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
 #include "tarn/Errors/Fail.h"
 #include "tarn/FileSystem/File.h"
 
@@ -186,7 +187,8 @@ void AIFFWriter::WriteHeader() {
   s.MoveTo(0);
   const std::int64_t data = DataBytes(frames_);
   PutU32(s, AIFFReader::kFORM);
-  PutU32(s, static_cast<std::uint32_t>(headerSize_ - kChunkHeader + data + (data & 1)));
+  PutU32(s, static_cast<std::uint32_t>(headerSize_ - kChunkHeader +
+                                       WAVEWriter::PadDataLength(data, false)));
   PutU32(s, form_);
   if (form_ == AIFFReader::kAIFC) {
     PutU32(s, AIFFReader::kFVER);
@@ -207,7 +209,8 @@ void AIFFWriter::UpdateDataLength(std::int64_t frames) {
   const std::int64_t data = DataBytes(frames);
   const std::int64_t comm = kFormHeader + (form_ == AIFFReader::kAIFC ? kFVERChunk : 0);
   s.MoveTo(4);
-  PutU32(s, static_cast<std::uint32_t>(headerSize_ - kChunkHeader + data + (data & 1)));
+  PutU32(s, static_cast<std::uint32_t>(headerSize_ - kChunkHeader +
+                                       WAVEWriter::PadDataLength(data, false)));
   s.MoveTo(comm + kChunkHeader + 2);
   PutU32(s, static_cast<std::uint32_t>(frames));
   s.MoveTo(headerSize_ - kSoundHeader + 4);
