@@ -24,7 +24,7 @@ std::shared_ptr<HoldOpenMetaData> SoundFileFormat::AcquireMetaData(MetaDataMode 
   std::shared_ptr<SoundFileFormat> keepAlive = weak_from_this().lock();
   const bool writing = mode == MetaDataMode::kReadWrite;
   {
-    std::lock_guard<std::mutex> guard(metaDataLock_);
+    std::lock_guard<std::recursive_mutex> guard(metaDataLock_);
     if (metaDataHolds_ == 0) {
       OpenMetaDataOnDisk(writing);
       metaDataWritten_ = false;
@@ -62,12 +62,12 @@ std::shared_ptr<HoldOpenMetaData> SoundFileFormat::AcquireMetaData(MetaDataMode 
 }
 
 void SoundFileFormat::FlushMetaData() {
-  std::lock_guard<std::mutex> guard(metaDataLock_);
+  std::lock_guard<std::recursive_mutex> guard(metaDataLock_);
   if (WriteMetaDataToDisk()) metaDataWritten_ = true;
 }
 
 void SoundFileFormat::ReleaseMetaData(MetaDataMode mode) noexcept {
-  std::lock_guard<std::mutex> guard(metaDataLock_);
+  std::lock_guard<std::recursive_mutex> guard(metaDataLock_);
   if (mode == MetaDataMode::kReadWrite) {
     try {
       if (WriteMetaDataToDisk()) metaDataWritten_ = true;
@@ -102,17 +102,17 @@ std::shared_ptr<HoldOpenMetaData> SoundFileFormat::OpenMetaData() {
 }
 
 bool SoundFileFormat::MetaDataIsOpen() {
-  std::lock_guard<std::mutex> guard(metaDataLock_);
+  std::lock_guard<std::recursive_mutex> guard(metaDataLock_);
   return metaDataHolds_ > 0;
 }
 
 void SoundFileFormat::DontSetModDateBackOnMetaDataClose() {
-  std::lock_guard<std::mutex> guard(metaDataLock_);
+  std::lock_guard<std::recursive_mutex> guard(metaDataLock_);
   keepModDateOnClose_ = true;
 }
 
 void SoundFileFormat::GetFileModDateAtMetaDataOpen(FileDate& date) {
-  std::lock_guard<std::mutex> guard(metaDataLock_);
+  std::lock_guard<std::recursive_mutex> guard(metaDataLock_);
   if (metaDataHolds_ == 0 || !modDateAtOpen_) FailOSErr(kParamErr);
   date = *modDateAtOpen_;
 }

@@ -21,7 +21,8 @@
 //   rw.reset();    // last handle: the metadata closes
 //
 // A handle keeps its format object alive when the format is owned by a
-// shared_ptr (as the format cache's are). Handles may be made, copied (as
+// shared_ptr (as the format cache's are); handles of a format that is not
+// must be released before it is destroyed. Handles may be made, copied (as
 // shared_ptrs) and released on any thread.
 
 #include <memory>

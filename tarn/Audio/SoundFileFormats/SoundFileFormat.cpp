@@ -94,7 +94,7 @@ void SoundFileFormat::ChangeLengthInternal(const SoundFileAttributes& attributes
   if (ShouldSwitchToExtendedFileFormat(frames)) SwitchToExtendedFileFormat(frames);
   AdjustLengthInHeader(attributes, frames);
   {
-    std::lock_guard<std::mutex> guard(metaDataLock_);
+    std::lock_guard<std::recursive_mutex> guard(metaDataLock_);
     lengthChanged_ = true;
   }
   ThrowOutCachedMetaDataPositions();

@@ -32,9 +32,11 @@
 // DontSetModDateBackOnMetaDataClose was called during the session.
 //
 // Threads: the metadata counting is thread-safe, and the hooks run one at a
-// time under the object's metadata lock (a hook must not make or release
-// access objects of its own format). Other operations follow the concrete
-// format's rules; UpdateFileSpec must not race with users of GetFile.
+// time under the object's metadata lock. A hook may call this object's
+// metadata queries (MetaDataIsOpen, DontSetModDateBackOnMetaDataClose, ...)
+// and change the length, but must not make or release access handles of
+// its own format. Other operations follow the concrete format's rules;
+// UpdateFileSpec must not race with users of GetFile.
 // Failures are TarnErrors; file operations pass on the file system's.
 
 #include <cstdint>
@@ -295,8 +297,9 @@ class SoundFileFormat : public std::enable_shared_from_this<SoundFileFormat> {
 
   FileSpecification file_;
 
-  // Guards the fields below and serialises the metadata hooks.
-  std::mutex metaDataLock_;
+  // Guards the fields below and serialises the metadata hooks; recursive so
+  // that a hook may use this object's metadata queries.
+  std::recursive_mutex metaDataLock_;
   int metaDataHolds_ = 0;            // live handles of any mode
   int metaDataWriters_ = 0;          // live read-write handles; <= metaDataHolds_
   bool metaDataWritten_ = false;     // a flush changed the file this session

@@ -1,10 +1,7 @@
-// The makers of the WAVE and AIFF format objects. Until the AIFF format is
-// part of the library, making one fails with the cache's "unsupported"
-// error.
+// The makers of the WAVE and AIFF format objects.
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatMakers.h"
 
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatFailImpl.h"
+#include "tarn/Audio/SoundFileFormats/AIFFSoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"
 
 namespace tarn::sffimpl {
@@ -14,8 +11,7 @@ std::shared_ptr<SoundFileFormat> MakeWAVEFormat(const FileSpecification& file) {
 }
 
 std::shared_ptr<SoundFileFormat> MakeAIFFFormat(const FileSpecification& file) {
-  FailWithText("SoundFileFormatCache", SoundFileFormatCache::kUnsupportedFormatErr,
-               "the AIFF format is not available", file);
+  return std::make_shared<AIFFSoundFileFormat>(file);
 }
 
 }  // namespace tarn::sffimpl

@@ -1,5 +1,6 @@
 // The readers' part of the probes: whether the WAVE and AIFF readers parse
-// a file. Until the AIFF reader is part of the library, no AIFF file parses.
+// a file. Any error while reading counts as "does not parse".
+#include "tarn/Audio/SoundFileFormats/AIFFReader.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileProbes.h"
 #include "tarn/Audio/SoundFileFormats/WAVEReader.h"
 
@@ -13,6 +14,12 @@ bool WAVEReaderCanParse(const FileSpecification& file) noexcept {
   }
 }
 
-bool AIFFReaderCanParse(const FileSpecification&) noexcept { return false; }
+bool AIFFReaderCanParse(const FileSpecification& file) noexcept {
+  try {
+    return AIFFReader(file).CanParse();
+  } catch (...) {
+    return false;
+  }
+}
 
 }  // namespace tarn
