@@ -10,6 +10,7 @@
 #include <functional>
 #include <iterator>
 #include <optional>
+#include <random>
 #include <string>
 #include <vector>
 
@@ -115,7 +116,10 @@ class TempDir {
  public:
   TempDir() {
     const auto* info = ::testing::UnitTest::GetInstance()->current_test_info();
-    std::string name = "tarn-sff-";
+    // One token per process: several copies of the suite (other worktrees,
+    // other presets) may run at once on the same machine.
+    static const std::string token = std::to_string(std::random_device{}());
+    std::string name = "tarn-sff-" + token + "-";
     if (info != nullptr) name += std::string(info->test_suite_name()) + "-" + info->name();
     for (char& ch : name)
       if (ch == '/') ch = '_';
