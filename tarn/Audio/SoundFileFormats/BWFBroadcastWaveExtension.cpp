@@ -6,7 +6,7 @@
 #include <cstring>
 #include <string>
 
-#include "tarn/Audio/SoundFileFormats/LittleEndianBytes.h"
+#include "tarn/Audio/SoundFileFormats/LittleEndianBytesImpl.h"
 
 namespace tarn {
 

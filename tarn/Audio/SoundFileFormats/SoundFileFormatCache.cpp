@@ -6,7 +6,7 @@
 #include "tarn/Audio/SoundFileFormats/RIFFType.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatFailImpl.h"
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatMakers.h"
+#include "tarn/Audio/SoundFileFormats/SoundFileFormatMakersImpl.h"
 #include "tarn/Errors/Fail.h"
 #include "tarn/FileSystem/File.h"
 

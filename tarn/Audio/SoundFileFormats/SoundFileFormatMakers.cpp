@@ -1,5 +1,5 @@
 // The makers of the WAVE and AIFF format objects.
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatMakers.h"
+#include "tarn/Audio/SoundFileFormats/SoundFileFormatMakersImpl.h"
 
 #include "tarn/Audio/SoundFileFormats/AIFFSoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <bit>
 
-#include "tarn/Audio/SoundFileFormats/LittleEndianBytes.h"
+#include "tarn/Audio/SoundFileFormats/LittleEndianBytesImpl.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
 #include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
 #include "tarn/Errors/Fail.h"

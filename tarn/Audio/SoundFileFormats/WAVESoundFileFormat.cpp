@@ -5,7 +5,7 @@
 #include <cstring>
 #include <map>
 
-#include "tarn/Audio/SoundFileFormats/LittleEndianBytes.h"
+#include "tarn/Audio/SoundFileFormats/LittleEndianBytesImpl.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatFailImpl.h"
 #include "tarn/Audio/SoundFileFormats/WAVEWriter.h"

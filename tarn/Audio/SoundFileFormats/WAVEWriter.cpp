@@ -4,7 +4,7 @@
 #include <limits>
 
 #include "tarn/Audio/SoundFileFormats/HostChannelOrder.h"
-#include "tarn/Audio/SoundFileFormats/LittleEndianBytes.h"
+#include "tarn/Audio/SoundFileFormats/LittleEndianBytesImpl.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
 #include "tarn/FileSystem/File.h"
 #include "tarn/Streams/CFileStream.h"
