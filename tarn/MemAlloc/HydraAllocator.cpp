@@ -396,7 +396,12 @@ void* BuddySystemSubAllocator::ResizeInPlace(void* user, std::size_t size) noexc
     const std::size_t total = rounded + kPrefixBytes;
     // Stay while the request is still large and uses at least half the chunk.
     if (total < kLargeThreshold || total > ch->size || total * 2 < ch->size) return nullptr;
-    if (rounded > ch->logical) std::memset(u + ch->logical, 0, rounded - ch->logical);
+    // Bytes past the caller's size stay zero, so that a later growth (in
+    // place or by copying the logical size) shows only zeros there.
+    if (rounded > ch->logical)
+      std::memset(u + ch->logical, 0, rounded - ch->logical);
+    else
+      std::memset(u + size, 0, ch->logical - size);
     Add(logicalBytes, static_cast<int64_t>(rounded) - static_cast<int64_t>(ch->logical));
     ch->logical = rounded;
     return user;
@@ -409,7 +414,10 @@ void* BuddySystemSubAllocator::ResizeInPlace(void* user, std::size_t size) noexc
   // Stay when it fits and would not fit a class two steps smaller.
   if (wanted > c || wanted < c - 1) return nullptr;
   const uint64_t old = HeaderLogical(h);
-  if (rounded > old) std::memset(u + old, 0, rounded - old);
+  if (rounded > old)
+    std::memset(u + old, 0, rounded - old);
+  else
+    std::memset(u + size, 0, old - size);
   Add(logicalBytes, static_cast<int64_t>(rounded) - static_cast<int64_t>(old));
   Store32(block, (h & 0xFFFF) | static_cast<uint32_t>(rounded / 4) << 16);
   return user;
