@@ -19,6 +19,7 @@ struct ClassTable {
   std::array<uint64_t, 255> sizes{};
   int count = 0;
   std::array<uint8_t, 256> small{};
+  std::array<uint32_t, 255> quickCap{};  // up to 32 KB of unmerged blocks, at least 4
 };
 
 constexpr ClassTable MakeClassTable() {
@@ -30,6 +31,10 @@ constexpr ClassTable MakeClassTable() {
     const uint64_t a = t.sizes[t.count - 2], b = t.sizes[t.count - 1];
     if (a > UINT64_MAX - b) break;
     t.sizes[t.count++] = a + b;
+  }
+  for (int k = 0; k < t.count; ++k) {
+    const uint64_t n = 32'768 / t.sizes[k];
+    t.quickCap[k] = n < 4 ? 4 : static_cast<uint32_t>(n);
   }
   for (int i = 0, k = 0; i < 256; ++i) {
     while (t.sizes[k] < 4u * static_cast<uint64_t>(i)) ++k;
@@ -153,6 +158,7 @@ BuddySystemSubAllocator::BuddySystemSubAllocator() noexcept
 }
 
 BuddySystemSubAllocator::~BuddySystemSubAllocator() {
+  Tidy();
   // Only fully merged chunks remain (no live blocks): give them back.
   for (int c = 0; c <= fChunkClass; ++c) {
     while (uint8_t* block = ListPop(c)) {
@@ -232,10 +238,38 @@ static inline bool CanServe(int x, int c) noexcept {
   return x == c || (x == c + 1 && c >= 1) || x >= c + 2;
 }
 
+void BuddySystemSubAllocator::Tidy() noexcept {
+  if (!fNeedsTidying) return;
+  fNeedsTidying = false;
+  for (int c = 0; c <= fChunkClass; ++c) {
+    uint8_t* block = fQuick[c];
+    fQuick[c] = nullptr;
+    fQuickCount[c] = 0;
+    while (block) {
+      uint8_t* next = NextOf(block);
+      const uint32_t h = Load32(block);
+      Store32(block, MakeHeader(c, true, HeaderSide(h), HeaderMemory(h)));
+      FreeBlockMerging(block);
+      block = next;
+    }
+  }
+}
+
 uint8_t* BuddySystemSubAllocator::TakeBlock(int c) noexcept {
+  if (uint8_t* block = fQuick[c]) {
+    fQuick[c] = NextOf(block);
+    --fQuickCount[c];
+    return block;
+  }
   if (uint8_t* block = ListPop(c)) return block;
   int k = c + (c >= 1 ? 1 : 2);
   while (k <= fChunkClass && !fFreeLists[k]) ++k;
+  if (k > fChunkClass && fNeedsTidying) {
+    Tidy();
+    if (uint8_t* block = ListPop(c)) return block;
+    k = c + (c >= 1 ? 1 : 2);
+    while (k <= fChunkClass && !fFreeLists[k]) ++k;
+  }
   if (k > fChunkClass) {
     if (c > fChunkClass || !Grow()) return nullptr;
     k = c + (c >= 1 ? 1 : 2);
@@ -368,6 +402,14 @@ void BuddySystemSubAllocator::FreeLocal(void* user) noexcept {
   Add(bytesInUse, -static_cast<int64_t>(kClasses.sizes[c]));
   Add(logicalBytes, -static_cast<int64_t>(HeaderLogical(h)));
   Add(blocks, -1);
+  if (fQuickCount[c] < kClasses.quickCap[c]) {
+    Store32(block, MakeHeader(c, false, HeaderSide(h), HeaderMemory(h)));
+    NextOf(block) = fQuick[c];
+    fQuick[c] = block;
+    ++fQuickCount[c];
+    fNeedsTidying = true;
+    return;
+  }
   Store32(block, MakeHeader(c, true, HeaderSide(h), HeaderMemory(h)));
   FreeBlockMerging(block);
 }

@@ -183,6 +183,8 @@ class alignas(16) BuddySystemSubAllocator {
   void ListRemove(int c, uint8_t* block) noexcept;
   [[nodiscard]] uint8_t* ListPop(int c) noexcept;
   void FreeBlockMerging(uint8_t* block) noexcept;
+  // Merges every block waiting on the quick lists.
+  void Tidy() noexcept;
   void Add(std::atomic<uint64_t>& figure, int64_t delta) noexcept {
     figure.store(figure.load(std::memory_order_relaxed) + static_cast<uint64_t>(delta),
                  std::memory_order_relaxed);
@@ -191,6 +193,16 @@ class alignas(16) BuddySystemSubAllocator {
   int fChunkClass;                        // class of a whole chunk (51,104 bytes)
   int fSmallestChunkClass;                // smallest class accepted when memory is short
   uint8_t* fFreeLists[kMaxClasses] = {};  // heads of doubly linked lists
+  // Freed blocks not yet merged, per class (singly linked through +8; their
+  // headers still read as in use, so no buddy merges with them). A block
+  // freed and allocated again in the same class skips the split and merge
+  // steps; the lists are merged (tidied) before the pool grows and when the
+  // sub-allocator is destroyed.
+  // Invariant: fQuickCount[c] == length of fQuick[c] <= the class's cap
+  // (32 KB of blocks, at least 4).
+  uint8_t* fQuick[kMaxClasses] = {};
+  uint32_t fQuickCount[kMaxClasses] = {};
+  bool fNeedsTidying = false;  // some quick list is non-empty
   // One fully merged chunk (a free root block, listed) kept instead of being
   // given back, so that a thread freeing and allocating its last block does
   // not take a chunk from the pool each time.
