@@ -172,6 +172,12 @@ Figures Now() {
           HydraDebugging::BytesInUseInOperatorNewPools()};
 }
 
+// The pool thread collects orphans every 500 ms; waits up to 5 s.
+void WaitForNoOrphans() {
+  for (int i = 0; i < 500 && HydraDebugging::OrphanedSubAllocators() != 0; ++i)
+    std::this_thread::sleep_for(std::chrono::milliseconds(10));
+}
+
 class HydraStress : public ::testing::TestWithParam<int> {};
 
 TEST_P(HydraStress, ThreadsAllocateFreeHandOverAndResize) {
@@ -181,6 +187,9 @@ TEST_P(HydraStress, ThreadsAllocateFreeHandOverAndResize) {
   Failures failures;
   std::vector<std::thread> threads;
   threads.reserve(static_cast<std::size_t>(threadCount) * 3);
+  // Let earlier tests' ended threads be collected first: their pools may
+  // still hold blocks freed elsewhere, which would leave the figures.
+  WaitForNoOrphans();
   const Figures start = Now();
   // Three generations: later threads start while earlier ones end, and take
   // over the blocks that the ended threads left behind.
@@ -204,9 +213,7 @@ TEST_P(HydraStress, ThreadsAllocateFreeHandOverAndResize) {
   EXPECT_EQ(failures.misaligned.load(), 0);
   EXPECT_EQ(failures.overwritten.load(), 0);
   EXPECT_EQ(failures.nullBlocks.load(), 0);
-  // The pool thread collects the orphans every 500 ms.
-  for (int i = 0; i < 500 && HydraDebugging::OrphanedSubAllocators() != 0; ++i)
-    std::this_thread::sleep_for(std::chrono::milliseconds(10));
+  WaitForNoOrphans();
   EXPECT_EQ(HydraDebugging::OrphanedSubAllocators(), 0u);
   const Figures end = Now();
   EXPECT_EQ(end.blocks, start.blocks);
