@@ -51,11 +51,14 @@ void FixedBlockAllocMT::SetSize(std::size_t blockSize, std::size_t alignment) no
 void* FixedBlockAllocMT::allocate(std::size_t size) {
   if (size != fBlockSize) return ::operator new[](size);
   if (void* block = DequeueAtomic(fHead)) return block;
-  // A block needs room for its stack link.
+  // A block holds its stack link while free: at least a pointer's size and
+  // alignment, whatever smaller alignment was asked for.
   const std::size_t usable = fBlockSize < sizeof(void*) ? sizeof(void*) : fBlockSize;
-  auto* heap = static_cast<unsigned char*>(::operator new[](fAlign + usable + kBlockPrefix));
-  const uint64_t start = reinterpret_cast<uintptr_t>(heap) + fAlign + kBlockPrefix;
-  auto* block = reinterpret_cast<unsigned char*>(static_cast<uintptr_t>(start & fMask));
+  const std::size_t align = fAlign < alignof(void*) ? alignof(void*) : fAlign;
+  const uint64_t mask = fMask & ~uint64_t{alignof(void*) - 1};
+  auto* heap = static_cast<unsigned char*>(::operator new[](align + usable + kBlockPrefix));
+  const uint64_t start = reinterpret_cast<uintptr_t>(heap) + align + kBlockPrefix;
+  auto* block = reinterpret_cast<unsigned char*>(static_cast<uintptr_t>(start & mask));
   std::memcpy(block - 16, &heap, sizeof heap);
   std::memcpy(block - 8, &kBlockMarker, sizeof kBlockMarker);
   return block;

@@ -7,7 +7,9 @@
 // other size go straight to operator new[] / delete[], so the class can
 // serve as the allocator of a container whose node size is known.
 //
-// Each carved block is preceded, inside its heap allocation, by the start of
+// Blocks are aligned to the alignment, and always at least to a pointer's
+// alignment (a free block holds the stack's link). Each carved block is
+// preceded, inside its heap allocation, by the start of
 // that allocation (8 bytes at block - 16) and the marker 0xF794ABC1 (4 bytes
 // at block - 8, for inspection only). Blocks go back to the heap only through
 // flush(), so a block on the stack is always readable memory.

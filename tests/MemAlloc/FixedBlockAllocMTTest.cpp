@@ -42,7 +42,8 @@ TEST(FixedBlockAllocMT, CarvedBlocksAlignedMarkedAndReusedLastInFirstOut) {
       uintptr_t heap;
       std::memcpy(&heap, static_cast<uint8_t*>(p) - 16, 8);
       EXPECT_LE(heap + 16, reinterpret_cast<uintptr_t>(p));
-      EXPECT_LE(reinterpret_cast<uintptr_t>(p), heap + 16 + align);
+      EXPECT_LE(reinterpret_cast<uintptr_t>(p), heap + 16 + std::max<std::size_t>(align, 8));
+      EXPECT_EQ(reinterpret_cast<uintptr_t>(p) % alignof(void*), 0u);
     }
     blocks.deallocate(a, 40);
     blocks.deallocate(b, 40);
