@@ -27,7 +27,11 @@ TEST(OperatorNew, AlignedFormsHonourEveryPowerOfTwo) {
         std::memset(x, 0x5A, size);
       }
       ::operator delete(p, a);
+#ifdef __cpp_sized_deallocation
       ::operator delete[](q, size, a);
+#else
+      ::operator delete[](q, a);
+#endif
       ::operator delete(r, a, std::nothrow);
       ::operator delete[](s, a, std::nothrow);
     }
@@ -43,7 +47,11 @@ TEST(OperatorNew, PlainNothrowAndSizedForms) {
     EXPECT_EQ(reinterpret_cast<uintptr_t>(p) % __STDCPP_DEFAULT_NEW_ALIGNMENT__, 0u);
     std::memset(p, 1, size);
     std::memset(q, 1, size);
+#ifdef __cpp_sized_deallocation
     ::operator delete(p, size);
+#else
+    ::operator delete(p);
+#endif
     ::operator delete[](q, std::nothrow);
   }
   struct alignas(64) Wide {
