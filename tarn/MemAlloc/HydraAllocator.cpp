@@ -219,7 +219,7 @@ void BuddySystemSubAllocator::ListRemove(int c, uint8_t* block) noexcept {
   else
     fFreeLists[c] = next;
   if (next) PrevOf(next) = prev;
-  if (block == fSpareChunk) fSpareChunk = nullptr;
+  if (HeaderSide(Load32(block)) == kRoot) --fSpareChunks;
 }
 
 uint8_t* BuddySystemSubAllocator::ListPop(int c) noexcept {
@@ -236,6 +236,7 @@ bool BuddySystemSubAllocator::Grow() noexcept {
     uint8_t* root = chunk + 16;
     Store32(root, MakeHeader(c, true, kRoot, kRoot));
     ListPush(c, root);
+    ++fSpareChunks;
     return true;
   }
   return false;
@@ -340,12 +341,11 @@ void BuddySystemSubAllocator::FreeBlockMerging(uint8_t* block) noexcept {
     Store32(block, h);
   }
   if (HeaderSide(h) == kRoot) {
-    if (fSpareChunk == nullptr) {
-      fSpareChunk = block;
-    } else {
+    if (fSpareChunks == kSpareChunks) {
       HydraAllocator::GlobalPool().GiveBack(block - 16);
       return;
     }
+    ++fSpareChunks;
   }
   ListPush(HeaderClass(h), block);
 }

@@ -203,10 +203,13 @@ class alignas(16) BuddySystemSubAllocator {
   uint8_t* fQuick[kMaxClasses] = {};
   uint32_t fQuickCount[kMaxClasses] = {};
   bool fNeedsTidying = false;  // some quick list is non-empty
-  // One fully merged chunk (a free root block, listed) kept instead of being
-  // given back, so that a thread freeing and allocating its last block does
-  // not take a chunk from the pool each time.
-  uint8_t* fSpareChunk = nullptr;
+  // Fully merged chunks (free root blocks, listed) are kept, up to
+  // kSpareChunks, instead of being given back, so that a thread whose use
+  // swings around a chunk boundary does not take chunks from the pool and
+  // give them back all the time.
+  // Invariant: fSpareChunks == number of root blocks on the free lists.
+  static constexpr uint32_t kSpareChunks = 8;
+  uint32_t fSpareChunks = 0;
   uint64_t fLargeBlocks = 0;  // live blocks taken from the pool directly
 };
 
