@@ -8,6 +8,7 @@
 #include <new>
 
 #include "tarn/MemAlloc/HydraAllocatorImpl.h"
+#include "tarn/Threads/TarnThreadID.h"
 
 namespace tarn {
 
@@ -88,6 +89,38 @@ inline void StoreOwner(uint8_t* at, BuddySystemSubAllocator* o) noexcept {
   std::memcpy(at, &o, sizeof o);
 }
 
+// Kept out of line so that the compiler, not knowing the size's bound, calls
+// the C runtime's memset (wide vector stores) rather than the string
+// instructions it picks for a bounded size.
+[[gnu::noinline]] void ZeroWide(uint8_t* p, std::size_t bytes) noexcept {
+  std::memset(p, 0, bytes);
+}
+
+// Zero-fills the buddy block's user area p (16-byte aligned) for rounded
+// bytes. Short areas are filled in whole 16-byte units (a block's user area
+// always ends on such a unit: class sizes are multiples of 32) by plain
+// vector stores, which beat both a call and the string instructions.
+inline void ZeroUserArea(uint8_t* p, std::size_t rounded) noexcept {
+#if defined(__GNUC__)
+  if (rounded > 192) {
+    ZeroWide(p, rounded);
+    return;
+  }
+  using Unit = long long __attribute__((vector_size(16), may_alias));
+  auto* unit = reinterpret_cast<Unit*>(p);
+  Unit* const end = unit + (rounded + 15) / 16;
+  const Unit zero{};
+  for (; unit + 2 <= end; unit += 2) {
+    unit[0] = zero;
+    unit[1] = zero;
+    __asm__("" : : "r"(unit) : "memory");  // keeps the loop from becoming a memset call
+  }
+  if (unit != end) *unit = zero;
+#else
+  std::memset(p, 0, rounded);
+#endif
+}
+
 // What the bytes in front of a user pointer say about it.
 struct BlockInfo {
   uint32_t magic = 0;        // 0: not one of ours
@@ -154,7 +187,9 @@ struct RegistryGuard {
   RegistryGuard& operator=(const RegistryGuard&) = delete;
 };
 
-constinit thread_local BuddySystemSubAllocator* tCurrent = nullptr;
+// Read straight off the thread pointer (initial-exec): the allocation and
+// free paths must not call into the runtime to find it.
+constinit thread_local BuddySystemSubAllocator* tCurrent TARN_TLS_INITIAL_EXEC = nullptr;
 
 }  // namespace
 
@@ -351,7 +386,23 @@ void BuddySystemSubAllocator::FreeBlockMerging(uint8_t* block) noexcept {
 }
 
 void* BuddySystemSubAllocator::Allocate(std::size_t size) noexcept {
-  if (HasRemoteFrees()) DrainRemoteFrees();
+  if (HasRemoteFrees()) [[unlikely]]
+    DrainRemoteFrees();
+  // 1 to kQuickSizeLimit bytes: the class is one index lookup away, and a
+  // block freed earlier in that class is usually waiting on its quick list.
+  if (size - 1 < kQuickSizeLimit) [[likely]] {
+    const std::size_t rounded = (size + 3) & ~std::size_t{3};
+    const int c = kClasses.small[(rounded + kPrefixBytes + kBlockHeaderBytes) / 4];
+    uint8_t* block = fQuick[c];
+    if (block) [[likely]] {
+      fQuick[c] = NextOf(block);
+      --fQuickCount[c];
+    } else {
+      block = TakeBlock(c);
+      if (!block) return nullptr;
+    }
+    return HandOut(block, c, rounded);
+  }
   if (size == 0) size = 1;
   if (size > (std::size_t{1} << 48)) return nullptr;
   const std::size_t rounded = (size + 3) & ~std::size_t{3};
@@ -359,13 +410,17 @@ void* BuddySystemSubAllocator::Allocate(std::size_t size) noexcept {
   const int c = ClassForNeed(rounded + kPrefixBytes + kBlockHeaderBytes);
   uint8_t* block = TakeBlock(c);
   if (!block) return nullptr;
+  return HandOut(block, c, rounded);
+}
+
+inline void* BuddySystemSubAllocator::HandOut(uint8_t* block, int c, std::size_t rounded) noexcept {
   const uint32_t h = Load32(block);
   Store32(block, MakeHeader(c, false, HeaderSide(h), HeaderMemory(h)) |
                      static_cast<uint32_t>(rounded / 4) << 16);
   StoreOwner(block + 4, this);
   Store32(block + 12, kBuddyMagic);
   uint8_t* user = block + 16;
-  std::memset(user, 0, rounded);
+  ZeroUserArea(user, rounded);
   Add(bytesInUse, static_cast<int64_t>(kClasses.sizes[c]));
   Add(logicalBytes, static_cast<int64_t>(rounded));
   Add(blocks, 1);
@@ -406,13 +461,17 @@ void BuddySystemSubAllocator::FreeLocal(void* user) noexcept {
     FreeLarge(user);
     return;
   }
-  uint8_t* block = u - 16;
+  FreeBuddyLocal(u);
+}
+
+inline void BuddySystemSubAllocator::FreeBuddyLocal(uint8_t* user) noexcept {
+  uint8_t* block = user - 16;
   const uint32_t h = Load32(block);
   const int c = HeaderClass(h);
   Add(bytesInUse, -static_cast<int64_t>(kClasses.sizes[c]));
   Add(logicalBytes, -static_cast<int64_t>(HeaderLogical(h)));
   Add(blocks, -1);
-  if (fQuickCount[c] < kClasses.quickCap[c]) {
+  if (fQuickCount[c] < kClasses.quickCap[c]) [[likely]] {
     Store32(block, MakeHeader(c, false, HeaderSide(h), HeaderMemory(h)));
     NextOf(block) = fQuick[c];
     fQuick[c] = block;
@@ -670,11 +729,28 @@ void HydraAllocator::SubAllocatorDestructor(void* subAllocator) noexcept {
 }
 
 void* HydraAllocator::Allocate(std::size_t size) noexcept {
-  BuddySystemSubAllocator* s = GetSubAllocatorForCurrentThread();
-  return s ? s->Allocate(size) : nullptr;
+  BuddySystemSubAllocator* s = tCurrent;
+  if (!s) [[unlikely]] {
+    s = GetSubAllocatorForCurrentThread();
+    if (!s) return nullptr;
+  }
+  return s->Allocate(size);
 }
 
 void HydraAllocator::Deallocate(void* p) noexcept {
+  // The common case first: a buddy block of the calling thread (a buddy
+  // block's magic sits right before the user memory; a page-aligned pointer
+  // needs the readability check below).
+  auto* u = static_cast<uint8_t*>(p);
+  BuddySystemSubAllocator* self = tCurrent;
+  if ((reinterpret_cast<uintptr_t>(u) & 4095) != 0 && self) [[likely]] {
+    if (Peek32(u - 4) == kBuddyMagic && LoadOwner(u - 12) == self) [[likely]] {
+      self->FreeBuddyLocal(u);
+      if (self->HasRemoteFrees()) [[unlikely]]
+        self->DrainRemoteFrees();
+      return;
+    }
+  }
   if (!p) return;
   const BlockInfo info = Inspect(p);
   if (info.magic == 0) {
@@ -682,7 +758,6 @@ void HydraAllocator::Deallocate(void* p) noexcept {
     return;
   }
   BuddySystemSubAllocator* owner = LoadOwner(info.owner);
-  BuddySystemSubAllocator* self = tCurrent;
   if (owner == self) {
     self->FreeLocal(p);
   } else {

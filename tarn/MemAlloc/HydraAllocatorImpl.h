@@ -148,6 +148,8 @@ class alignas(16) BuddySystemSubAllocator {
   [[nodiscard]] void* Allocate(std::size_t size) noexcept;
   // Frees a block of this sub-allocator on its own thread.
   void FreeLocal(void* user) noexcept;
+  // FreeLocal for a block known to come from the buddy pool.
+  void FreeBuddyLocal(uint8_t* user) noexcept;
   // Resizes a block of this sub-allocator in place when it fits; null when
   // it does not (p untouched).
   [[nodiscard]] void* ResizeInPlace(void* user, std::size_t size) noexcept;
@@ -175,6 +177,11 @@ class alignas(16) BuddySystemSubAllocator {
 
  private:
   struct FreeBlock;
+  // Sizes up to this many bytes take the quick-list path of Allocate.
+  static constexpr std::size_t kQuickSizeLimit = 1000;
+  // Writes the header and prefix of a block taken for rounded bytes of class
+  // c and zero-fills the user area.
+  void* HandOut(uint8_t* block, int c, std::size_t rounded) noexcept;
   void* AllocateLarge(std::size_t rounded) noexcept;
   void FreeLarge(void* user) noexcept;
   [[nodiscard]] uint8_t* TakeBlock(int c) noexcept;
