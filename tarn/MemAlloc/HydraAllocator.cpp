@@ -670,7 +670,6 @@ void HydraGlobalPool::StartPoolThread() noexcept {
 // ---- HydraAllocator -------------------------------------------------------------
 
 namespace {
-std::atomic<HydraAllocator*> gInstance{nullptr};
 alignas(HydraAllocator) unsigned char gInstanceStorage[sizeof(HydraAllocator)];
 alignas(HydraGlobalPool) unsigned char gPoolStorage[sizeof(HydraGlobalPool)];
 }  // namespace
@@ -681,11 +680,10 @@ HydraAllocator::HydraAllocator() noexcept : fPool(new (gPoolStorage) HydraGlobal
                  hydra_os::LastSystemError());
 }
 
-HydraAllocator& HydraAllocator::Instance() noexcept {
-  if (HydraAllocator* instance = gInstance.load(std::memory_order_acquire)) return *instance;
+HydraAllocator& HydraAllocator::MakeInstance() noexcept {
   static HydraAllocator* const made = [] {
     auto* instance = new (gInstanceStorage) HydraAllocator();
-    gInstance.store(instance, std::memory_order_release);
+    sInstance.store(instance, std::memory_order_release);
     // Started after the instance is published: the thread may use it.
     instance->fPool->StartPoolThread();
     return instance;

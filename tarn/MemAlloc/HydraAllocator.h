@@ -71,7 +71,11 @@ class HydraAllocator {
   // The process-wide instance, constructed on first use (thread-safe). The
   // construction allocates the first 256 pooled chunks and starts the pool
   // thread.
-  [[nodiscard]] static HydraAllocator& Instance() noexcept;
+  [[nodiscard]] static HydraAllocator& Instance() noexcept {
+    if (HydraAllocator* instance = sInstance.load(std::memory_order_acquire)) [[likely]]
+      return *instance;
+    return MakeInstance();
+  }
 
   // Zero-filled, 16-byte-aligned memory of at least size bytes (0 counts as
   // 1), or null when the operating system refuses memory. Any thread.
@@ -103,9 +107,13 @@ class HydraAllocator {
   HydraAllocator() noexcept;
   ~HydraAllocator() = delete;  // lives until the process ends
 
+  // Constructs the instance on the first call (thread-safe) and publishes it.
+  static HydraAllocator& MakeInstance() noexcept;
   BuddySystemSubAllocator* GetSubAllocatorForCurrentThread() noexcept;
   BuddySystemSubAllocator* GetSubAllocatorOrphan() noexcept;
 
+  // The instance once constructed, read without a call by Instance().
+  static inline std::atomic<HydraAllocator*> sInstance{nullptr};
   HydraGlobalPool* fPool;
   std::atomic<bool> fIgnoreUnknownDeallocations{false};
 };
