@@ -134,7 +134,13 @@ class HydraGlobalPool {
 class alignas(16) BuddySystemSubAllocator {
  public:
   BuddySystemSubAllocator* next = nullptr;  // link on the orphan stack (first word)
-  AtomicStackHead remoteFrees;              // user pointers pushed by other threads
+  // Other threads write the remote-free stack's head; the padding keeps it
+  // off every cache line holding the fields the owner writes on each call
+  // (the object is 16-byte aligned), so that those writes do not bounce the
+  // line between the threads.
+  unsigned char padBeforeRemoteFrees[56] = {};
+  AtomicStackHead remoteFrees;  // user pointers pushed by other threads
+  unsigned char padAfterRemoteFrees[48] = {};
 
   BuddySystemSubAllocator() noexcept;
   BuddySystemSubAllocator(const BuddySystemSubAllocator&) = delete;
