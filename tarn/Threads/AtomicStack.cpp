@@ -30,11 +30,6 @@ bool SwapHead(AtomicStackHead* head, const AtomicStackHead& seen, void* newTop) 
 
 }  // namespace
 
-void* AtomicStackNext(const void* node) noexcept {
-  return std::atomic_ref<void*>(*static_cast<void**>(const_cast<void*>(node)))
-      .load(std::memory_order_relaxed);
-}
-
 void EnqueueAtomic(AtomicStackHead* head, void* node) noexcept { SpliceAtomic(head, node, node); }
 
 void SpliceAtomic(AtomicStackHead* head, void* first, void* last) noexcept {

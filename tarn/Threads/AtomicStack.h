@@ -19,6 +19,7 @@
 // readable memory while any thread may still be popping (they may be reused,
 // never returned to the system).
 
+#include <atomic>
 #include <cstdint>
 
 namespace tarn {
@@ -44,6 +45,9 @@ void EnqueueAtomic(AtomicStackHead* head, void* node) noexcept;
 void SpliceAtomic(AtomicStackHead* head, void* first, void* last) noexcept;
 
 // The link stored in a node's first word (for walking a detached chain).
-[[nodiscard]] void* AtomicStackNext(const void* node) noexcept;
+[[nodiscard]] inline void* AtomicStackNext(const void* node) noexcept {
+  return std::atomic_ref<void*>(*static_cast<void**>(const_cast<void*>(node)))
+      .load(std::memory_order_relaxed);
+}
 
 }  // namespace tarn
