@@ -46,6 +46,8 @@
 #include "tarn/FileSystem/FileDate.h"
 #include "tarn/FileSystem/FileSpecification.h"
 #include "tarn/FileSystem/FileTypes.h"
+#include "tarn/MemAlloc/FixedBlockAllocMT.h"
+#include "tarn/MemAlloc/HydraAllocator.h"
 #include "tarn/Streams/CBufferedStream.h"
 #include "tarn/Streams/CFileStream.h"
 #include "tarn/Streams/CHandleStream.h"
