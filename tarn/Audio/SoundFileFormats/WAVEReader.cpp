@@ -99,7 +99,9 @@ void WAVEReader::Parse() {
   if (formatTag_ != WAVEWriter::kFormatTagPCM && formatTag_ != WAVEWriter::kFormatTagFloat &&
       formatTag_ != WAVEWriter::kFormatTagExtensible)
     Fail(kUnsupportedFormat);
-  if (channels_ <= 0 || sampleSize_ <= 0) Fail(kUnsupportedFormat);
+  // SoundFileAttributes holds the channel count in 16 signed bits: a larger
+  // count would reach the audio layer negative.
+  if (channels_ <= 0 || channels_ > kMaxChannels || sampleSize_ <= 0) Fail(kUnsupportedFormat);
   if (!hasData_) Fail(kNoDataChunk);
   DetermineHeaderSize(dataLength_, dataHeaderOffset_ + WAVEWriter::GetChunkHeaderSize(wave64_));
   if (acid_.mPresent && acid_.mNumberOfBeats > 0) {

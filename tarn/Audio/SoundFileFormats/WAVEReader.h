@@ -62,6 +62,9 @@ class WAVEReader {
   static constexpr int kNoFormatChunk = 2;      // no "fmt " chunk (or one too short)
   static constexpr int kNoDataChunk = 3;        // no "data" chunk
   static constexpr int kUnsupportedFormat = 4;  // format tag, channels or sample size unusable
+  // The most channels a readable file may have (the 16-bit signed count of
+  // SoundFileAttributes); more is kUnsupportedFormat.
+  static constexpr int kMaxChannels = 0x7FFF;
 
   // The "acid" chunk (loop and tempo facts) and its "strc" slice list.
   struct AcidInfo {
