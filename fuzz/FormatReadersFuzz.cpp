@@ -37,6 +37,7 @@
 #include <string_view>
 #include <vector>
 
+#include "FuzzScratch.h"
 #include "tarn/Audio/SoundFileFormats/AIFFReader.h"
 #include "tarn/Audio/SoundFileFormats/MetaDataAccess.h"
 #include "tarn/Audio/SoundFileFormats/RIFFType.h"
@@ -95,19 +96,7 @@ class Watch {
 // One scratch file per process, rewritten by every run. The ".wav" name
 // lets the WAVE probe's name rule pass, so the probe reaches the reader.
 struct Scratch {
-  std::filesystem::path path;
-  Scratch() {
-    std::error_code ec;
-    std::filesystem::path dir = "/dev/shm";
-    if (!std::filesystem::is_directory(dir, ec)) dir = std::filesystem::temp_directory_path();
-    path = dir / ("tarn-format-fuzz-" + std::to_string(::getpid()) + ".wav");
-  }
-  Scratch(const Scratch&) = delete;
-  Scratch& operator=(const Scratch&) = delete;
-  ~Scratch() {
-    std::error_code ignored;
-    std::filesystem::remove(path, ignored);
-  }
+  fuzz::ScratchFile path{"tarn-format-fuzz", ".wav"};
 };
 
 Scratch& GetScratch() {
@@ -115,12 +104,7 @@ Scratch& GetScratch() {
   return scratch;
 }
 
-void WriteBytes(const std::filesystem::path& path, const std::uint8_t* data, std::size_t size) {
-  std::FILE* f = std::fopen(path.c_str(), "wb");
-  if (f == nullptr) Violation("cannot create the scratch file");
-  if (size > 0 && std::fwrite(data, 1, size, f) != size) Violation("cannot write the scratch file");
-  if (std::fclose(f) != 0) Violation("cannot close the scratch file");
-}
+using fuzz::WriteBytes;
 
 // Runs `body`; a TarnError of one of `kinds` is the answer "cannot", any
 // other exception is a violation. Returns whether `body` finished.

@@ -27,6 +27,7 @@
 #include <string>
 #include <vector>
 
+#include "FuzzScratch.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFileEditor.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
 #include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
@@ -36,7 +37,7 @@
 namespace tarn {
 namespace {
 
-using Bytes = std::vector<std::uint8_t>;
+using fuzz::Bytes;
 
 // Inputs larger than this are skipped: the editor's cost grows with the file
 // and small files reach every path.
@@ -64,23 +65,8 @@ constexpr RIFFType kSoundTag = MakeRIFFType("SSND");
 // Two scratch files per process, reused by every run: the input as given
 // (listed only) and the copy that is edited.
 struct Scratch {
-  std::filesystem::path original;
-  std::filesystem::path copy;
-  Scratch() {
-    std::error_code ec;
-    std::filesystem::path dir = "/dev/shm";
-    if (!std::filesystem::is_directory(dir, ec)) dir = std::filesystem::temp_directory_path();
-    const std::string stem = "tarn-riff-fuzz-" + std::to_string(::getpid());
-    original = dir / (stem + "-in.bin");
-    copy = dir / (stem + "-edit.bin");
-  }
-  Scratch(const Scratch&) = delete;
-  Scratch& operator=(const Scratch&) = delete;
-  ~Scratch() {
-    std::error_code ignored;
-    std::filesystem::remove(original, ignored);
-    std::filesystem::remove(copy, ignored);
-  }
+  fuzz::ScratchFile original{"tarn-riff-fuzz", "-in.bin"};
+  fuzz::ScratchFile copy{"tarn-riff-fuzz", "-edit.bin"};
 };
 
 Scratch& GetScratch() {
@@ -88,26 +74,8 @@ Scratch& GetScratch() {
   return scratch;
 }
 
-void WriteBytes(const std::filesystem::path& path, const std::uint8_t* data, std::size_t size) {
-  std::FILE* f = std::fopen(path.c_str(), "wb");
-  if (f == nullptr) Violation("cannot create the scratch file");
-  if (size > 0 && std::fwrite(data, 1, size, f) != size) Violation("cannot write the scratch file");
-  if (std::fclose(f) != 0) Violation("cannot close the scratch file");
-}
-
-Bytes ReadBytes(const std::filesystem::path& path) {
-  Bytes out;
-  std::FILE* f = std::fopen(path.c_str(), "rb");
-  if (f == nullptr) Violation("cannot open the scratch file");
-  std::uint8_t buffer[4096];
-  for (;;) {
-    const std::size_t n = std::fread(buffer, 1, sizeof buffer, f);
-    out.insert(out.end(), buffer, buffer + n);
-    if (n < sizeof buffer) break;
-  }
-  std::fclose(f);
-  return out;
-}
+using fuzz::ReadBytes;
+using fuzz::WriteBytes;
 
 FileSpecification SpecOf(const std::filesystem::path& path) {
   return FileSpecification(UString(path.c_str()));

@@ -22,6 +22,7 @@
 #include <string>
 #include <vector>
 
+#include "FuzzScratch.h"
 #include "tarn/Audio/SoundFileFormats/WAVEReader.h"
 #include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"
 #include "tarn/Errors/TarnError.h"
@@ -29,7 +30,7 @@
 namespace tarn {
 namespace {
 
-using Bytes = std::vector<std::uint8_t>;
+using fuzz::Bytes;
 constexpr std::size_t kMaxInput = 64 * 1024;
 
 [[noreturn]] void Violation(const char* what) {
@@ -43,43 +44,12 @@ constexpr std::size_t kMaxInput = 64 * 1024;
   } while (false)
 
 struct Scratch {
-  std::filesystem::path original;
-  std::filesystem::path copy;
-  Scratch() {
-    std::error_code ec;
-    std::filesystem::path dir = "/dev/shm";
-    if (!std::filesystem::is_directory(dir, ec)) dir = std::filesystem::temp_directory_path();
-    const std::string stem = "tarn-wave-fuzz-" + std::to_string(::getpid());
-    original = dir / (stem + "-in.wav");
-    copy = dir / (stem + "-edit.wav");
-  }
-  Scratch(const Scratch&) = delete;
-  Scratch& operator=(const Scratch&) = delete;
-  ~Scratch() {
-    std::error_code ignored;
-    std::filesystem::remove(original, ignored);
-    std::filesystem::remove(copy, ignored);
-  }
+  fuzz::ScratchFile original{"tarn-wave-fuzz", "-in.wav"};
+  fuzz::ScratchFile copy{"tarn-wave-fuzz", "-edit.wav"};
 };
 
-void WriteBytes(const std::filesystem::path& path, const std::uint8_t* data, std::size_t size) {
-  std::FILE* f = std::fopen(path.c_str(), "wb");
-  if (f == nullptr) Violation("cannot create the scratch file");
-  if (size > 0 && std::fwrite(data, 1, size, f) != size) Violation("cannot write the scratch file");
-  if (std::fclose(f) != 0) Violation("cannot close the scratch file");
-}
-
-Bytes ReadBytes(const std::filesystem::path& path) {
-  std::error_code ec;
-  const auto size = std::filesystem::file_size(path, ec);
-  Bytes out(ec ? 0 : size);
-  std::FILE* f = std::fopen(path.c_str(), "rb");
-  if (f == nullptr) Violation("cannot open a scratch file");
-  if (!out.empty() && std::fread(out.data(), 1, out.size(), f) != out.size())
-    Violation("cannot read a scratch file");
-  std::fclose(f);
-  return out;
-}
+using fuzz::ReadBytes;
+using fuzz::WriteBytes;
 
 FileSpecification SpecOf(const std::filesystem::path& path) {
   return FileSpecification(UString(path.c_str()));
