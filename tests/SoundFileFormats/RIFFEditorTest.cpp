@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <cstring>
 #include <random>
 #include <thread>
 
@@ -575,6 +576,18 @@ TEST(RIFFEditorTables, Wave64IdentifiersAsPublishedAndOurOwn) {
     EXPECT_EQ(wave.UUIDForTag(tag, false), id) << p.tag;
     EXPECT_EQ(wave.UUIDForTag(tag, true), id) << p.tag;
     EXPECT_EQ(wave.TagForUUID(id), tag) << p.tag;
+  }
+  // Standard chunks without a published identifier: their characters and
+  // the WAVE chunks' common tail, both ways.
+  for (const char* tag :
+       {"cue ", "smpl", "inst", "strc", "plst", "iXML", "axml", "cart", "PEAK", "DISP", "id3 "}) {
+    TarnCOM::UUIDBytes bytes;
+    const std::uint8_t tail[12] = {0xF3, 0xAC, 0xD3, 0x11, 0x8C, 0xD1,
+                                   0x00, 0xC0, 0x4F, 0x8E, 0xDB, 0x8A};
+    std::memcpy(bytes.bytes, tag, 4);
+    std::memcpy(bytes.bytes + 4, tail, 12);
+    EXPECT_EQ(wave.UUIDForTag(RIFFTypeFromChars(tag), true), UUIDObj(bytes)) << tag;
+    EXPECT_EQ(wave.TagForUUID(UUIDObj(bytes)), RIFFTypeFromChars(tag)) << tag;
   }
   EXPECT_TRUE(wave.IsWave64Container(UUIDObj(UString(published[0].id))));
   EXPECT_FALSE(wave.IsWave64Container(UUIDObj(UString(published[1].id))));

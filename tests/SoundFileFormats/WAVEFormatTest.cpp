@@ -190,10 +190,19 @@ TEST(WAVEFormat, WritingWhatTheFileHoldsChangesNothing) {
   EXPECT_EQ(ReadFile(path), before);
 }
 
-TEST(WAVEFormat, LoopsAndRegions) {
-  TempDir dir;
-  const auto path = dir.Path("loops.wav");
-  WriteFile(path, FileImage({{kFmt, Fmt16(1)}, {kData, Pattern(2000)}}, Container::kRIFF));
+void CheckLoopsAndRegionsRoundTrip(const std::filesystem::path& path);
+
+TEST(WAVEFormat, LoopsAndRegionsInBothForms) {
+  for (const Container c : {Container::kRIFF, Container::kWave64}) {
+    SCOPED_TRACE(c == Container::kRIFF ? "RIFF" : "Wave64");
+    TempDir dir;
+    const auto path = dir.Path("loops.wav");
+    WriteFile(path, FileImage({{kFmt, Fmt16(1)}, {kData, Pattern(2000)}}, c));
+    CheckLoopsAndRegionsRoundTrip(path);
+  }
+}
+
+void CheckLoopsAndRegionsRoundTrip(const std::filesystem::path& path) {
   auto format = std::make_shared<WAVESoundFileFormat>(SpecOf(path));
   std::vector<SoundFileFormatLoop> loops(2);
   loops[0].mStart = 10;

@@ -46,6 +46,10 @@ constexpr std::array<const char*, 40> kOwnTags{
     "ddOV", "ANNO", "Dscr", "AUTH", "(c) ", "ACdI", "basc", "acid", "regn", "qzfd",
     "qzf1", "qzf2", "qzf3", "qzf4", "qzf5", "qzf6", "qzf7", "qzf8", "qzf9", "qzfa"};
 
+// Standard chunks of WAVE files beyond those with published identifiers.
+constexpr std::array<const char*, 11> kStandardTags{"cue ", "smpl", "inst", "strc", "plst", "iXML",
+                                                    "axml", "cart", "PEAK", "DISP", "id3 "};
+
 bool UUIDLess(const UUIDObj& a, const UUIDObj& b) { return a.GetBytes() < b.GetBytes(); }
 
 }  // namespace
@@ -78,6 +82,11 @@ WaveRIFFFormatHandler::WaveRIFFFormatHandler() {
       {MakeRIFFType("MRKR"), kMarkerID},
       {MakeRIFFType("SmLt"), kSummaryListID},
   };
+  // Standard WAVE chunks that have no published Wave64 identifier take the
+  // pattern of those that do: their four characters, then the twelve bytes
+  // the published WAVE chunks share. Markers, loops and the other common
+  // chunks can then be written to Wave64 files as to RIFF ones.
+  for (const char* tag : kStandardTags) byTag_.push_back(published(tag, tag, kWaveSuffix));
   for (const char* tag : kOwnTags)
     byTag_.push_back({RIFFTypeFromChars(tag), MakeID(RIFFTypeFromChars(tag), kOwnSuffix)});
   byUUID_ = byTag_;

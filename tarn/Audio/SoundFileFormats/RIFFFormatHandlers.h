@@ -7,7 +7,10 @@
 // ("riff", "list", "wave", "fmt ", "fact", "data", "levl", "junk", "bext",
 // the marker chunk "MRKR" and the summary list "SmLt"); the variant "bext"
 // and "levl" identifiers some writers use are read as those tags too, but
-// never written. The library's own metadata chunks get fixed identifiers of
+// never written. Other standard WAVE chunks ("cue ", "smpl", "inst", "strc",
+// "plst", "iXML", "axml", "cart", "PEAK", "DISP", "id3 ") follow the published
+// pattern: their four characters, then the twelve bytes the published WAVE
+// chunks share. The library's own metadata chunks get fixed identifiers of
 // its own: the tag's four characters followed by twelve fixed bytes. An
 // identifier it does not know reads as the tag "Unkn".
 //

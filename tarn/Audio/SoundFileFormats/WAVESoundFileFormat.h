@@ -24,8 +24,8 @@
 //     (which 1) and the original time stamp: "bext";
 //   - tempo, root note and meter: "acid";
 //   - the recording indicator: "Rec!".
-// In Wave64 files only tags with Wave64 identifiers can be written ("cue ",
-// "smpl" and "strc" have none: writing them throws -50).
+// In Wave64 files only tags with Wave64 identifiers can be written (every
+// chunk above has one); another tag throws -50.
 //
 // Length and Wave64: AdjustLengthInHeader rewrites the container and "data"
 // sizes; a RIFF file whose new length needs 64-bit sizes
