@@ -7,6 +7,7 @@
 #include <filesystem>
 
 #include "SoundFileFormats/ChunkFileTestUtil.h"
+#include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
 #include "tarn/Audio/SoundFileFormats/WAVEReader.h"
 #include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
@@ -346,6 +347,9 @@ TEST(WAVEFormat, SwitchToWave64InPlaceKeepsTheAudioWhereItIs) {
       const Bytes before = ReadFile(path);
       auto format = std::make_shared<WAVESoundFileFormat>(SpecOf(path));
       const auto attributes = format->GetFileAttributes();
+      // A RIFF recording with room to switch may grow as far as Wave64 does.
+      EXPECT_EQ(format->GetMaxFrameCount(),
+                SoundFileFormatCache::GetMaxFrameCountForType(MakeRIFFType(".W64"), 3 * channels));
       format->SwitchToExtendedFileFormat(50);
       EXPECT_TRUE(format->IsExtendedFormat());
       const auto after = format->GetFileAttributes();
@@ -386,6 +390,10 @@ TEST(WAVEFormat, NoSwitchWithoutRoom) {
   EXPECT_STREQ(error->GetKind().c_str(), "WAVESoundFileFormat");
   EXPECT_EQ(error->GetIntErrorCode(), WAVESoundFileFormat::kCannotSwitchErr);
   EXPECT_FALSE(format->IsExtendedFormat());
+  // Without room to switch, the file stops where 32-bit sizes do.
+  EXPECT_EQ(format->GetMaxFrameCount(),
+            SoundFileFormatCache::GetMaxFrameCountForType(MakeRIFFType(".wav"), 4));
+  EXPECT_LT(format->GetMaxFrameCount(), SampleCount(std::int64_t{1} << 30));
 }
 
 TEST(WAVEFormat, Wave64ThresholdIsTheRIFFSizeLimit) {

@@ -7,6 +7,7 @@
 
 #include "tarn/Audio/SoundFileFormats/LittleEndianBytesImpl.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
+#include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatFailImpl.h"
 #include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
 #include "tarn/Errors/Fail.h"
@@ -124,6 +125,14 @@ std::uint32_t WAVESoundFileFormat::GetActualFileType() {
 }
 
 bool WAVESoundFileFormat::IsExtendedFormat() { return Reader().IsWave64(); }
+
+SampleCount WAVESoundFileFormat::GetMaxFrameCount() {
+  // A RIFF file without room for the Wave64 headers stops where 32-bit sizes do.
+  WAVEReader& r = Reader();
+  const std::uint32_t type =
+      r.IsWave64() || r.CanSwitchToWave64() ? GetActualFileType() : MakeRIFFType(".wav");
+  return SoundFileFormatCache::GetMaxFrameCountForType(type, GetFileAttributes().mBytesPerFrame);
+}
 
 SoundFileAttributes WAVESoundFileFormat::GetFileAttributes() {
   WAVEReader& r = Reader();

@@ -81,6 +81,9 @@ class WAVESoundFileFormat : public SoundFileFormat {
   // ".W64" for a Wave64 file, "WAVE" otherwise.
   [[nodiscard]] std::uint32_t GetActualFileType() override;
   [[nodiscard]] std::uint32_t GetPerferredFileCreator() override { return 0; }
+  // What 64-bit sizes hold for Wave64 files and RIFF files that can switch to
+  // Wave64 in place; what 32-bit sizes hold for any other RIFF file.
+  [[nodiscard]] SampleCount GetMaxFrameCount() override;
   [[nodiscard]] SoundFileAttributes GetFileAttributes() override;
   [[nodiscard]] HostChannelOrder GetChannelOrder() override;
   bool HasFileTempoAndSyncPoint(float& tempo, SampleCount& syncPoint) override;
