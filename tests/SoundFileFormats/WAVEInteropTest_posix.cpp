@@ -16,9 +16,12 @@
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
+#include <memory>
 #include <string>
+#include <vector>
 
 #include "SoundFileFormats/ChunkFileTestUtil.h"
+#include "tarn/Audio/SoundFileFormats/SoundFileRegionList.h"
 #include "tarn/Audio/SoundFileFormats/WAVEReader.h"
 #include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
@@ -271,6 +274,105 @@ TEST_F(WAVEInterop, FilesWeWriteOpenEverywhere) {
                   std::to_string(c.channels) + "\nduration_ts=" + std::to_string(kFrames) +
                   "\nformat_name=" + (c.wave64 ? "w64" : "wav"));
   }
+}
+
+// Markers ("cue ") and loops ("smpl") travel both ways: libsndfile's cue
+// points and instrument loops read here as markers and loops, and ours read
+// in libsndfile as cue points and loops at the same frames.
+TEST_F(WAVEInterop, MarkersAndLoopsTravelBothWaysWithLibsndfile) {
+  const fs::path theirs = dir_.Path("theirs.wav");
+  {
+    SF_INFO info{};
+    info.samplerate = 44100;
+    info.channels = 2;
+    info.format = SF_FORMAT_WAV | SF_FORMAT_PCM_16;
+    SNDFILE* sf = sf_open(theirs.c_str(), SFM_WRITE, &info);
+    ASSERT_NE(sf, nullptr) << sf_strerror(nullptr);
+    SF_CUES cues{};
+    cues.cue_count = 2;
+    for (std::uint32_t i = 0; i < 2; ++i) {
+      SF_CUE_POINT& c = cues.cue_points[i];
+      c.indx = static_cast<std::int32_t>(i + 1);
+      c.position = c.sample_offset = i == 0 ? 100u : 2500u;
+      c.fcc_chunk = 0x61746164;  // "data", little-endian
+    }
+    ASSERT_EQ(sf_command(sf, SFC_SET_CUE, &cues, sizeof cues), SF_TRUE);
+    SF_INSTRUMENT inst{};
+    inst.basenote = 60;
+    inst.velocity_hi = inst.key_hi = 127;
+    inst.loop_count = 2;
+    inst.loops[0] = {SF_LOOP_FORWARD, 1000, 2000, 0};
+    inst.loops[1] = {SF_LOOP_ALTERNATING, 3000, 4000, 3};
+    ASSERT_EQ(sf_command(sf, SFC_SET_INSTRUMENT, &inst, sizeof inst), SF_TRUE);
+    std::vector<short> audio(2 * 5000, 0);
+    ASSERT_EQ(sf_writef_short(sf, audio.data(), 5000), 5000);
+    sf_close(sf);
+  }
+  // What libsndfile reads back of its own file is what we must read.
+  SF_INFO info{};
+  SNDFILE* sf = sf_open(theirs.c_str(), SFM_READ, &info);
+  ASSERT_NE(sf, nullptr);
+  SF_INSTRUMENT theirInst{};
+  ASSERT_EQ(sf_command(sf, SFC_GET_INSTRUMENT, &theirInst, sizeof theirInst), SF_TRUE);
+  sf_close(sf);
+  ASSERT_EQ(theirInst.loop_count, 2);
+  {
+    auto format = std::make_shared<WAVESoundFileFormat>(SpecOf(theirs));
+    auto ro = format->GetReadOnlyMetaDataAccess();
+    ASSERT_EQ(format->NumberOfLoops(*ro), 2);
+    for (short i = 0; i < 2; ++i) {
+      SoundFileFormatLoop loop;
+      format->GetFileLoop(*ro, i, loop);
+      EXPECT_EQ(loop.mStart, SampleCount(theirInst.loops[i].start)) << i;
+      EXPECT_EQ(loop.mEnd, SampleCount(theirInst.loops[i].end)) << i;
+    }
+    SoundFileFormatLoop second;
+    format->GetFileLoop(*ro, 1, second);
+    EXPECT_EQ(second.mType, SoundFileFormatLoop::Type::kAlternating);
+    EXPECT_EQ(second.mPlayCount, 3u);
+    std::vector<std::int64_t> markers;
+    for (const auto& entry : *format->GetRegionList(*ro)) {
+      EXPECT_TRUE(entry.IsMarker());
+      markers.push_back(entry.mStart.AsLongLong());
+    }
+    EXPECT_EQ(markers, (std::vector<std::int64_t>{100, 2500}));
+  }
+
+  // Ours, read by libsndfile.
+  const fs::path ours = dir_.Path("ours.wav");
+  {
+    WAVEWriter writer(SpecOf(ours), 48000.0, 2, 1, 6000, 2, kSamp16, false, false);
+    writer.WriteHeader(0, 6000);
+    const Bytes audio(12000, 0);
+    writer.GetStream().PutRawDataToStream(audio.data(), static_cast<int>(audio.size()));
+  }
+  {
+    auto format = std::make_shared<WAVESoundFileFormat>(SpecOf(ours));
+    std::vector<SoundFileFormatLoop> loops(1);
+    loops[0].mStart = 500;
+    loops[0].mEnd = 1500;
+    SoundFileRegionList regions;
+    regions.Add({1, UString("Hit"), 250, 0});
+    regions.Add({2, UString("Bar"), 4000, 0});
+    auto rw = format->GetReadWriteMetaDataAccess();
+    format->AddFileLoops(*rw, loops);
+    format->WriteRegionList(*rw, regions.Flatten(), 0);
+  }
+  sf = sf_open(ours.c_str(), SFM_READ, &info);
+  ASSERT_NE(sf, nullptr);
+  SF_INSTRUMENT inst{};
+  ASSERT_EQ(sf_command(sf, SFC_GET_INSTRUMENT, &inst, sizeof inst), SF_TRUE);
+  SF_CUES cues{};
+  ASSERT_EQ(sf_command(sf, SFC_GET_CUE, &cues, sizeof cues), SF_TRUE);
+  sf_close(sf);
+  ASSERT_EQ(inst.loop_count, 1);
+  EXPECT_EQ(inst.loops[0].mode, SF_LOOP_FORWARD);
+  // libsndfile reads the loop as it reads its own: compare with its own round trip.
+  EXPECT_EQ(inst.loops[0].start, 500u);
+  EXPECT_EQ(inst.loops[0].end - theirInst.loops[0].end, 1500u - 2000u);
+  ASSERT_EQ(cues.cue_count, 2u);
+  EXPECT_EQ(cues.cue_points[0].sample_offset, 250u);
+  EXPECT_EQ(cues.cue_points[1].sample_offset, 4000u);
 }
 
 TEST_F(WAVEInterop, MediainfoShowsOurBroadcastExtension) {
