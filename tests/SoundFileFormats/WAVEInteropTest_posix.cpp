@@ -331,7 +331,8 @@ TEST_F(WAVEInterop, MarkersAndLoopsTravelBothWaysWithLibsndfile) {
     EXPECT_EQ(second.mType, SoundFileFormatLoop::Type::kAlternating);
     EXPECT_EQ(second.mPlayCount, 3u);
     std::vector<std::int64_t> markers;
-    for (const auto& entry : *format->GetRegionList(*ro)) {
+    const auto regions = format->GetRegionList(*ro);
+    for (const auto& entry : *regions) {
       EXPECT_TRUE(entry.IsMarker());
       markers.push_back(entry.mStart.AsLongLong());
     }
