@@ -8,6 +8,7 @@
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <initializer_list>
 #include <iterator>
 #include <optional>
 #include <random>
@@ -22,6 +23,19 @@
 namespace tarn::test {
 
 using Bytes = std::vector<std::uint8_t>;
+
+// `n` bytes of `v`, least significant first.
+inline Bytes LE(std::uint64_t v, int n) {
+  Bytes out;
+  for (int i = 0; i < n; ++i) out.push_back(static_cast<std::uint8_t>(v >> (8 * i)));
+  return out;
+}
+// The parts one after the other.
+inline Bytes Cat(std::initializer_list<Bytes> parts) {
+  Bytes out;
+  for (const auto& p : parts) out.insert(out.end(), p.begin(), p.end());
+  return out;
+}
 
 enum class Container { kRIFF, kFORM, kWave64 };
 

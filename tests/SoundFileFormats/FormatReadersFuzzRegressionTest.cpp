@@ -18,18 +18,6 @@ namespace {
 constexpr RIFFType kFmt = MakeRIFFType("fmt ");
 constexpr RIFFType kData = MakeRIFFType("data");
 
-Bytes LE(std::uint64_t v, int n) {
-  Bytes out;
-  for (int i = 0; i < n; ++i) out.push_back(static_cast<std::uint8_t>(v >> (8 * i)));
-  return out;
-}
-
-Bytes Cat(std::initializer_list<Bytes> parts) {
-  Bytes out;
-  for (const auto& p : parts) out.insert(out.end(), p.begin(), p.end());
-  return out;
-}
-
 // A 16-byte PCM "fmt " payload whose channel field is `channels` as stored.
 Bytes PcmFormat(std::uint16_t channels, std::uint32_t rate, std::uint16_t blockAlign) {
   return Cat({LE(1, 2), LE(channels, 2), LE(rate, 4), LE(rate * blockAlign, 4), LE(blockAlign, 2),

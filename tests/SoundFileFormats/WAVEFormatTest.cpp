@@ -20,12 +20,6 @@ namespace fs = std::filesystem;
 const RIFFType kFmt = MakeRIFFType("fmt ");
 const RIFFType kData = MakeRIFFType("data");
 
-Bytes LE(std::uint64_t v, int n) {
-  Bytes out;
-  for (int i = 0; i < n; ++i) out.push_back(static_cast<std::uint8_t>(v >> (8 * i)));
-  return out;
-}
-
 Bytes Fmt16(int channels) {
   Bytes b = LE(1, 2);
   for (const auto& part : {LE(static_cast<std::uint64_t>(channels), 2), LE(8000, 4),

@@ -12,17 +12,6 @@
 namespace tarn::test {
 namespace {
 
-Bytes LE(std::uint64_t v, int n) {
-  Bytes out;
-  for (int i = 0; i < n; ++i) out.push_back(static_cast<std::uint8_t>(v >> (8 * i)));
-  return out;
-}
-Bytes Cat(std::initializer_list<Bytes> parts) {
-  Bytes out;
-  for (const auto& p : parts) out.insert(out.end(), p.begin(), p.end());
-  return out;
-}
-
 Bytes Fmt(std::uint16_t tag, int channels, std::uint32_t rate, int bits) {
   const int block = channels * (bits / 8);
   return Cat({LE(tag, 2), LE(static_cast<std::uint64_t>(channels), 2), LE(rate, 4),

@@ -47,17 +47,6 @@ TEST(WAVEWriterLayout, AudioStartsAtTheSameByteInBothForms) {
   }
 }
 
-Bytes LE(std::uint64_t v, int n) {
-  Bytes out;
-  for (int i = 0; i < n; ++i) out.push_back(static_cast<std::uint8_t>(v >> (8 * i)));
-  return out;
-}
-Bytes Cat(std::initializer_list<Bytes> parts) {
-  Bytes out;
-  for (const auto& p : parts) out.insert(out.end(), p.begin(), p.end());
-  return out;
-}
-
 const Bytes kPCMGuidTail = {0x00, 0x00, 0x00, 0x00, 0x10, 0x00, 0x80,
                             0x00, 0x00, 0xAA, 0x00, 0x38, 0x9B, 0x71};
 
