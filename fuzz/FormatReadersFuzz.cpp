@@ -37,7 +37,7 @@
 #include <string_view>
 #include <vector>
 
-#include "FuzzScratch.h"
+#include "FuzzSupport.h"
 #include "tarn/Audio/SoundFileFormats/AIFFReader.h"
 #include "tarn/Audio/SoundFileFormats/MetaDataAccess.h"
 #include "tarn/Audio/SoundFileFormats/RIFFType.h"
@@ -59,17 +59,6 @@ constexpr int kMaxLoops = 64;
 // The largest allocation allowed beyond the file's length: the streams'
 // fixed buffers and the formats' fixed-size records.
 constexpr std::size_t kAllocationAllowance = 256 * 1024;
-
-[[noreturn]] void Violation(const char* what, std::int64_t a = 0, std::int64_t b = 0) {
-  std::fprintf(stderr, "FormatReadersFuzz: invariant violated: %s (%lld, %lld)\n", what,
-               static_cast<long long>(a), static_cast<long long>(b));
-  std::abort();
-}
-
-#define TARN_FUZZ_CHECK(cond, ...)                            \
-  do {                                                        \
-    if (!(cond)) Violation(#cond __VA_OPT__(, ) __VA_ARGS__); \
-  } while (false)
 
 // The largest single allocation since the last reset; counted only while
 // `armed` is set, so libFuzzer's own allocations do not count.
@@ -104,6 +93,7 @@ Scratch& GetScratch() {
   return scratch;
 }
 
+using fuzz::Violation;
 using fuzz::WriteBytes;
 
 // Runs `body`; a TarnError of one of `kinds` is the answer "cannot", any

@@ -27,7 +27,7 @@
 #include <string>
 #include <vector>
 
-#include "FuzzScratch.h"
+#include "FuzzSupport.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFileEditor.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
 #include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
@@ -51,17 +51,6 @@ constexpr std::size_t kMaxReads = 8;
 constexpr RIFFType kDataTag = MakeRIFFType("data");
 constexpr RIFFType kSoundTag = MakeRIFFType("SSND");
 
-[[noreturn]] void Violation(const char* what, std::int64_t a = 0, std::int64_t b = 0) {
-  std::fprintf(stderr, "RiffEditorFuzz: invariant violated: %s (%lld, %lld)\n", what,
-               static_cast<long long>(a), static_cast<long long>(b));
-  std::abort();
-}
-
-#define TARN_FUZZ_CHECK(cond, ...)                            \
-  do {                                                        \
-    if (!(cond)) Violation(#cond __VA_OPT__(, ) __VA_ARGS__); \
-  } while (false)
-
 // Two scratch files per process, reused by every run: the input as given
 // (listed only) and the copy that is edited.
 struct Scratch {
@@ -75,6 +64,7 @@ Scratch& GetScratch() {
 }
 
 using fuzz::ReadBytes;
+using fuzz::Violation;
 using fuzz::WriteBytes;
 
 FileSpecification SpecOf(const std::filesystem::path& path) {

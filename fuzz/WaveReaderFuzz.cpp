@@ -22,7 +22,7 @@
 #include <string>
 #include <vector>
 
-#include "FuzzScratch.h"
+#include "FuzzSupport.h"
 #include "tarn/Audio/SoundFileFormats/WAVEReader.h"
 #include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"
 #include "tarn/Errors/TarnError.h"
@@ -33,22 +33,13 @@ namespace {
 using fuzz::Bytes;
 constexpr std::size_t kMaxInput = 64 * 1024;
 
-[[noreturn]] void Violation(const char* what) {
-  std::fprintf(stderr, "WaveReaderFuzz: invariant violated: %s\n", what);
-  std::abort();
-}
-
-#define TARN_FUZZ_CHECK(cond)      \
-  do {                             \
-    if (!(cond)) Violation(#cond); \
-  } while (false)
-
 struct Scratch {
   fuzz::ScratchFile original{"tarn-wave-fuzz", "-in.wav"};
   fuzz::ScratchFile copy{"tarn-wave-fuzz", "-edit.wav"};
 };
 
 using fuzz::ReadBytes;
+using fuzz::Violation;
 using fuzz::WriteBytes;
 
 FileSpecification SpecOf(const std::filesystem::path& path) {

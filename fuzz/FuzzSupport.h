@@ -1,5 +1,6 @@
 #pragma once
-// Scratch files of the fuzz targets. Each process writes its inputs to files
+// What the fuzz targets share: the check that stops a run on a violated
+// invariant, and scratch files. Each process writes its inputs to files
 // of its own (named after the process id), in /dev/shm where it exists so
 // that no run waits for a disk, and removes them when it exits. A failure to
 // write or read them ends the run at once: it says nothing about the code
@@ -18,6 +19,19 @@
 namespace tarn::fuzz {
 
 using Bytes = std::vector<std::uint8_t>;
+
+// Ends the run; libFuzzer keeps the input that got here.
+[[noreturn]] inline void Violation(const char* what, std::int64_t a = 0, std::int64_t b = 0) {
+  std::fprintf(stderr, "fuzz: invariant violated: %s (%lld, %lld)\n", what,
+               static_cast<long long>(a), static_cast<long long>(b));
+  std::abort();
+}
+
+// Checks `cond`; up to two numbers after it are printed when it fails.
+#define TARN_FUZZ_CHECK(cond, ...)                                          \
+  do {                                                                      \
+    if (!(cond)) ::tarn::fuzz::Violation(#cond __VA_OPT__(, ) __VA_ARGS__); \
+  } while (false)
 
 [[noreturn]] inline void ScratchFailure(const char* what, const std::filesystem::path& path) {
   std::fprintf(stderr, "fuzz: cannot %s the scratch file %s\n", what, path.c_str());
