@@ -1,10 +1,12 @@
 // Umbrella header: includes every public header of the library.
 #pragma once
 
+#include "tarn/Audio/AsyncAudioReader.h"
 #include "tarn/Audio/AudioReadWriteBuffer.h"
 #include "tarn/Audio/BufConverter.h"
 #include "tarn/Audio/Dither.h"
 #include "tarn/Audio/FunctionGenerator.h"
+#include "tarn/Audio/InterAudioWriter.h"
 #include "tarn/Audio/MultiBuffer.h"
 #include "tarn/Audio/SampleBuffer.h"
 #include "tarn/Audio/SampleFormat.h"
