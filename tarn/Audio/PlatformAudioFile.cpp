@@ -17,6 +17,13 @@ constexpr std::uint64_t kBlockMask = kBlock - 1;
 
 bool IsAligned(std::uint64_t value) noexcept { return (value & kBlockMask) == 0; }
 
+// Whether [position, position + count) rounded out to whole blocks is a
+// range of signed 64-bit file offsets.
+bool FitsInOffsets(std::uint64_t position, std::uint64_t count) noexcept {
+  constexpr std::uint64_t kMax = std::uint64_t(std::numeric_limits<std::int64_t>::max()) - kBlock;
+  return position <= kMax && count <= kMax - position;
+}
+
 // The process-wide job thread of asynchronous reads, started on first use.
 class ReaderThread {
  public:
@@ -87,8 +94,7 @@ FileResult PlatformAudioFile::Impl::Read(void* buffer, std::uint64_t count,
                                          std::optional<std::uint64_t> at) {
   if (!driver_) return {kFileParamErr, 0};
   const std::uint64_t position = at.value_or(position_);
-  if (count > std::numeric_limits<std::uint64_t>::max() - position - kBlock)
-    return {kFileParamErr, 0};
+  if (!FitsInOffsets(position, count)) return {kFileParamErr, 0};
   if (Direct(buffer, count, position)) {
     if (const FileStatus status = driver_->SetFilePointer(position); status != kFileOK)
       return {status, 0};
@@ -118,7 +124,7 @@ FileStatus PlatformAudioFile::Impl::Write(const void* buffer, std::uint64_t coun
                                           std::optional<std::uint64_t> at) {
   if (!driver_) return kFileParamErr;
   const std::uint64_t position = at.value_or(position_);
-  if (count > std::numeric_limits<std::uint64_t>::max() - position - kBlock) return kFileParamErr;
+  if (!FitsInOffsets(position, count)) return kFileParamErr;
   const std::uint64_t newEnd = position + count;
   if (Direct(buffer, count, position)) {
     if (const FileStatus status = driver_->SetFilePointer(position); status != kFileOK)

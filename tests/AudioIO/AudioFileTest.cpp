@@ -2,7 +2,9 @@
 // interface and swapping writes, AudioInFile's reads at the edges of its
 // stretch and of a file cut while open.
 
+#include <atomic>
 #include <future>
+#include <tuple>
 
 #include "AudioIOTestUtil.h"
 

@@ -6,7 +6,10 @@
 #include <sndfile.h>
 #include <sys/resource.h>
 
+#include <pthread.h>
+
 #include <csignal>
+#include <future>
 
 #include "AudioIOTestUtil.h"
 
@@ -136,6 +139,14 @@ TEST(AudioOutFile, WritersAppendAfterThePresentAudioAndReadersRefuseOtherRates) 
   }
   auto again = Reopen(path, MakeRIFFType("WAVE"));
   {
+    // A chunk after the audio: the writer removes it before appending.
+    auto rw = again->GetReadWriteMetaDataAccess();
+    const Bytes note = Text("after the audio");
+    again->WriteMetaData(*rw, MakeRIFFType("note"), RCBlobMT(note.data(), note.size()));
+  }
+  ASSERT_GT(std::filesystem::file_size(path),
+            static_cast<std::uintmax_t>(again->GetFileAttributes().mOffsetToAudio + 200));
+  {
     auto out = again->MakeWriter();
     out->Write(second.data(), 30);
   }  // destruction closes and fixes the header
@@ -153,6 +164,27 @@ TEST(AudioOutFile, WritersAppendAfterThePresentAudioAndReadersRefuseOtherRates) 
   Bytes tail(20);
   EXPECT_EQ(reader->OutOfOrderRead(tail.data(), 0, 10), SampleCount(10));
   EXPECT_EQ(tail, Bytes(second.begin() + 40, second.end()));
+}
+
+TEST(AudioInFile, AsynchronousReadsCompleteOnTheNamedReaderThread) {
+  TempDir dir;
+  const auto path = dir.Path("n.wav");
+  auto format = NewRecording(path, Attributes(MakeRIFFType("WAVE"), 1, kSamp16, true));
+  {
+    const Bytes frames = Noise(64);
+    auto out = format->MakeWriter();
+    out->Write(frames.data(), 32);
+  }
+  auto reader =
+      Reopen(path, MakeRIFFType("WAVE"))->MakeReader({SampleCount(0), SampleCount(32)}, 48000.0);
+  Bytes buffer(64);
+  std::promise<std::string> name;
+  reader->OutOfOrderReadAsync(buffer.data(), 0, 32, [&](int, SampleCount) {
+    char text[32] = {};
+    pthread_getname_np(pthread_self(), text, sizeof text);
+    name.set_value(text);
+  });
+  EXPECT_EQ(name.get_future().get(), std::string("PlatformAudioFile Reader Thread").substr(0, 15));
 }
 
 // Lowers the process's file-size limit for its lifetime: writes past it

@@ -160,6 +160,13 @@ TEST(PlatformAudioFile, AFailedWriteLeavesThePositionAndReportsTheStatus) {
   const Bytes data = Noise(10);
   EXPECT_EQ(file.SyncWrite(data.data(), 10), kFileIOErr);
   EXPECT_EQ(file.GetPosition(), 100u);
+  // Ranges beyond 64-bit signed offsets are refused before any I/O.
+  Bytes buffer(10);
+  for (std::uint64_t at : {~std::uint64_t{0} - 5, std::uint64_t{1} << 63}) {
+    EXPECT_EQ(file.SyncRead(buffer.data(), 10, at).status, kFileParamErr);
+    EXPECT_EQ(file.SyncWrite(buffer.data(), 10, at), kFileParamErr);
+  }
+  EXPECT_EQ(file.SyncRead(buffer.data(), ~std::uint64_t{0}, 0).status, kFileParamErr);
 }
 
 TEST(PlatformAudioFile, AFileThatFailedToOpenAnswersParamErrEverywhere) {
