@@ -126,6 +126,10 @@ FileStatus PlatformAudioFile::Impl::Write(const void* buffer, std::uint64_t coun
   const std::uint64_t position = at.value_or(position_);
   if (!FitsInOffsets(position, count)) return kFileParamErr;
   const std::uint64_t newEnd = position + count;
+  if (count == 0) {  // nothing to move: above all, no block to pad the file with
+    position_ = position;
+    return kFileOK;
+  }
   if (Direct(buffer, count, position)) {
     if (const FileStatus status = driver_->SetFilePointer(position); status != kFileOK)
       return status;

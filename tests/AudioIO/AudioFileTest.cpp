@@ -1,276 +1,184 @@
-// AudioFile's byte order helpers, BasicAudioOutFile's block-aware disk
-// interface and swapping writes, AudioInFile's reads at the edges of its
-// stretch and of a file cut while open.
+// Byte-order helpers, BasicAudioOutFile's disk interface and swapping
+// writes, AudioInFile at the edges of its stretch and of a file cut while
+// open.
 
 #include <atomic>
 #include <future>
-#include <tuple>
 
 #include "AudioIOTestUtil.h"
 
 namespace tarn::test {
 namespace {
 
-TEST(AudioFile, ByteSwapsReverseEachSampleAndLeaveATrailingPartOfOne) {
-  struct Case {
-    void (*swap)(void*, std::int64_t) noexcept;
-    SampleFormat format;
-    int size;
-  };
-  const Case cases[] = {{AudioFile::ByteSwap16BitBuffer, kSamp16, 2},
-                        {AudioFile::ByteSwap24BitBuffer, kSamp24, 3},
-                        {AudioFile::ByteSwap32BitBuffer, kSampFloat32, 4},
-                        {AudioFile::ByteSwap64BitBuffer, kSampWide64B, 8}};
+TEST(AudioFile, ByteSwapsReverseEachWholeSample) {
   TempDir dir;
   WriteFile(dir.Path("f"), {});
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.size);
-    const Bytes original = Pattern(17);
-    Bytes expected = original;
-    const std::size_t whole = 17 / c.size * c.size;
-    for (std::size_t i = 0; i < whole; i += c.size)
-      std::reverse(expected.begin() + std::ptrdiff_t(i),
-                   expected.begin() + std::ptrdiff_t(i + c.size));
-    Bytes bytes = original;
-    c.swap(bytes.data(), 17);
-    EXPECT_EQ(bytes, expected);
-    // ByteSwapBuffer picks the same one from the sample format.
-    AudioFile file(SpecOf(dir.Path("f")), 0, kByteSwap, {c.format, 1, 48000.0}, false);
-    bytes = original;
-    file.ByteSwapBuffer(bytes.data(), 17);
-    EXPECT_EQ(bytes, expected);
+  using Swap = void (*)(void*, std::int64_t) noexcept;
+  const std::tuple<Swap, SampleFormat, int> cases[] = {
+      {AudioFile::ByteSwap16BitBuffer, kSamp16, 2},
+      {AudioFile::ByteSwap24BitBuffer, kSamp24, 3},
+      {AudioFile::ByteSwap32BitBuffer, kSampFloat32, 4},
+      {AudioFile::ByteSwap64BitBuffer, kSampWide64B, 8},
+      {nullptr, kSamp8, 1}};
+  for (const auto& [swap, format, size] : cases) {
+    Bytes bytes = Pattern(17), picked = bytes;
+    if (swap) swap(bytes.data(), 17);
+    EXPECT_EQ(bytes, Swapped(Pattern(17), size)) << size;  // a trailing part stays
+    AudioFile file(SpecOf(dir.Path("f")), 0, kByteSwap, {format, 1, 48000.0}, false);
+    file.ByteSwapBuffer(picked.data(), 17);
+    EXPECT_EQ(picked, bytes) << size;
   }
-  Bytes eight = Pattern(5);
-  AudioFile file(SpecOf(dir.Path("f")), 0, kByteSwap, {kSamp8, 1, 48000.0}, false);
-  file.ByteSwapBuffer(eight.data(), 5);
-  EXPECT_EQ(eight, Pattern(5));
-}
-
-TEST(AudioFile, ByteOrderOptions) {
   EXPECT_EQ(AudioFile::LSBOrderToByteSwapOption(true), kNoByteSwap);
   EXPECT_EQ(AudioFile::LSBOrderToByteSwapOption(false), kByteSwap);
-  TempDir dir;
-  WriteFile(dir.Path("f"), Bytes(100));
-  DSPSoundBiteSpec bite{SpecOf(dir.Path("f")),
-                        Attributes(0, 1, kSamp16, true),
-                        {},
-                        {SampleCount(0), SampleCount(50)}};
-  bite.mAttributes.mBytesPerSample = 2;
-  bite.mAttributes.mBytesPerFrame = 2;
-  AudioInFile in(bite, FileLength{50});
-  EXPECT_FALSE(in.ShouldSwapBuffer());
-  const bool table[][3] = {
-      {true, true, false}, {true, false, true}, {false, true, true}, {false, false, false}};
-  for (const auto& row : table) {
-    in.SetByteSwappingBasedOnDesriedOutputByteOrder(row[0], row[1]);
-    EXPECT_EQ(in.ShouldSwapBuffer(), row[2]);
-  }
 }
 
-class BasicAudioOutFileTest : public testing::Test {
- protected:
-  static constexpr std::int32_t kHeader = 100;
-  void SetUp() override { WriteFile(path_, Pattern(kHeader)); }
-  BasicAudioOutFile Open(SampleFormat format, int channels, ByteSwapOption swap) {
-    return BasicAudioOutFile(SpecOf(path_), kHeader, swap,
-                             {format, static_cast<std::int16_t>(channels), 48000.0}, 0);
-  }
-  TempDir dir_;
-  std::filesystem::path path_ = dir_.Path("out");
-};
-
-TEST_F(BasicAudioOutFileTest, BlockArithmeticOfTheDiskInterface) {
-  BasicAudioOutFile out(SpecOf(path_), kHeader, kNoByteSwap, {kSamp8, 1, 48000.0}, 0);
+TEST(BasicAudioOutFile, BlockArithmeticOfTheDiskInterface) {
+  TempDir dir;
+  const auto path = dir.Path("out");
+  WriteFile(path, Pattern(100));
+  BasicAudioOutFile out(SpecOf(path), 100, kNoByteSwap, {kSamp8, 1, 48000.0}, 0);
   InterAudioWriter::DiskAPI* disk = out.getDiskAPI();
-  ASSERT_EQ(disk, static_cast<InterAudioWriter::DiskAPI*>(&out));
   EXPECT_EQ(disk->GetBlockSize(), 4096);
-  struct Case {
-    std::int64_t bytePosition;
-    int tillBoundary;
-  };
-  for (const Case c :
-       {Case{8192, 4096}, {8193, 4095}, {4096 + 4095, 1}, {kHeader, 4096 - kHeader}}) {
-    out.SetWritePosition(c.bytePosition - kHeader);
-    EXPECT_EQ(disk->GetBytesTillNextBlockBoundary(), c.tillBoundary) << c.bytePosition;
+  for (auto [at, till] : {std::pair{8192, 4096}, {8193, 4095}, {8191, 1}, {100, 3996}}) {
+    out.SetWritePosition(at - 100);
+    EXPECT_EQ(disk->GetBytesTillNextBlockBoundary(), till) << at;
   }
-  // File of 100 bytes: nothing unfilled after the header; room is short.
   out.SetWritePosition(0);
   EXPECT_EQ(disk->GetUnFilledSpace(), 0);
-  SampleCount newLength = -1;
-  ASSERT_TRUE(disk->ShouldExtendFile(newLength, 10));
-  EXPECT_EQ(newLength, SampleCount(4096));  // (100 + 4096 - 100) / 1
-  out.SetEOF(newLength);
-  EXPECT_EQ(std::filesystem::file_size(path_), 4196u);
+  SampleCount length = -1;
+  ASSERT_TRUE(disk->ShouldExtendFile(length, 10));
+  EXPECT_EQ(length, SampleCount(4096));  // (100 + 4096 - 100) / 1
+  out.SetEOF(length);
   EXPECT_EQ(disk->GetUnFilledSpace(), 4096);
-  EXPECT_FALSE(disk->ShouldExtendFile(newLength, 4096));
-  out.SetWritePosition(4096 - kHeader);  // at a boundary: never extend
-  EXPECT_FALSE(disk->ShouldExtendFile(newLength, 1 << 20));
+  EXPECT_FALSE(disk->ShouldExtendFile(length, 4096));
+  out.SetWritePosition(3996);  // at a boundary: never
+  EXPECT_FALSE(disk->ShouldExtendFile(length, 1 << 20));
   out.SetEOF(0);
-  EXPECT_EQ(ReadFile(path_), Pattern(kHeader));
+  EXPECT_EQ(ReadFile(path), Pattern(100));
   out.Close();
   EXPECT_EQ(ErrorOf([&] { out.SetEOF(1); })->GetIntErrorCode(), kParamErr);
-  out.Close();  // again: nothing
 }
 
-TEST_F(BasicAudioOutFileTest, SwappedWritesLeaveTheCallersBufferAlone) {
-  for (auto [format, size] :
-       {std::pair{kSamp16, 2}, {kSamp24, 3}, {kSampFloat32, 4}, {kSampWide64B, 8}}) {
-    SCOPED_TRACE(size);
-    SetUp();
+TEST(BasicAudioOutFile, SwappedWritesLeaveTheCallersBufferAlone) {
+  TempDir dir;
+  const auto path = dir.Path("out");
+  for (auto [format, size] : {std::pair{kSamp16, 2}, {kSamp24, 3}, {kSampWide64B, 8}}) {
     for (ByteSwapOption swap : {kNoByteSwap, kByteSwap}) {
-      BasicAudioOutFile out = Open(format, 3, swap);
-      EXPECT_EQ(out.NeedToSwapBytes(), swap == kByteSwap);
+      WriteFile(path, Pattern(100));
       const Bytes frames = Noise(std::size_t(11) * 3 * size);
       Bytes buffer = frames;
-      out.Write(buffer.data(), 5);
-      out.Write(buffer.data() + 5 * 3 * size, 6);
+      {
+        BasicAudioOutFile out(SpecOf(path), 100, swap, {format, 3, 48000.0}, 0);
+        out.Write(buffer.data(), 5);
+        out.Write(buffer.data() + 5 * 3 * size, 6);
+        EXPECT_EQ(out.GetWritePosition(), SampleCount(11));
+      }
       EXPECT_EQ(buffer, frames);
-      EXPECT_EQ(out.GetWritePosition(), SampleCount(11));
-      EXPECT_EQ(out.GetFramesWritten(), SampleCount(11));
-      out.Close();
-      Bytes expected = frames;
-      if (swap == kByteSwap)
-        for (std::size_t i = 0; i < expected.size(); i += size)
-          std::reverse(expected.begin() + std::ptrdiff_t(i),
-                       expected.begin() + std::ptrdiff_t(i + size));
-      const Bytes file = ReadFile(path_);
-      ASSERT_EQ(file.size(), kHeader + frames.size());
-      EXPECT_TRUE(std::equal(expected.begin(), expected.end(), file.begin() + kHeader));
+      const Bytes file = ReadFile(path);
+      EXPECT_EQ(Bytes(file.begin() + 100, file.end()), swap ? Swapped(frames, size) : frames);
     }
   }
 }
 
-// A file of a 44-byte header and 1000 stereo 16-bit frames, read as the
-// stretch [100, 900).
+// 1000 stereo 16-bit frames after a 44-byte header.
 class AudioInFileTest : public testing::Test {
  protected:
-  static constexpr int kHeader = 44, kFrameSize = 4;
-  void SetUp() override {
-    contents_ = Noise(kHeader + 1000 * kFrameSize);
-    WriteFile(path_, contents_);
-  }
+  void SetUp() override { WriteFile(path_, contents_); }
   DSPSoundBiteSpec Bite(std::int64_t start, std::int64_t end, bool lsb = true) {
     SoundFileAttributes a = Attributes(MakeRIFFType("WAVE"), 2, kSamp16, lsb);
-    a.mBytesPerSample = 2;
-    a.mBytesPerFrame = kFrameSize;
-    a.mOffsetToAudio = kHeader;
+    a.mOffsetToAudio = 44;
     return {SpecOf(path_), a, HostChannelOrder::ForChannelCount(2), {start, end}};
   }
   Bytes FramesOfFile(std::int64_t first, std::int64_t count) {
-    const auto at = contents_.begin() + kHeader + first * kFrameSize;
-    return Bytes(at, at + count * kFrameSize);
+    return Bytes(contents_.begin() + 44 + first * 4, contents_.begin() + 44 + (first + count) * 4);
   }
   TempDir dir_;
   std::filesystem::path path_ = dir_.Path("in.wav");
-  Bytes contents_;
+  Bytes contents_ = Noise(44 + 4000);
+  Bytes buffer_ = Bytes(4000);
 };
 
 TEST_F(AudioInFileTest, StreamReadsStopAtTheStretchEnd) {
-  for (bool forced : {false, true}) {
-    AudioInFile in(Bite(100, 900), FileLength{1000}, {kCachedCaching, forced});
-    EXPECT_EQ(in.GetLengthInFrames(), SampleCount(800));
-    EXPECT_EQ(in.GetBytesPerFrame(), kFrameSize);
-    EXPECT_EQ(in.GetChannelOrder(), HostChannelOrder::ForChannelCount(2));
-    Bytes buffer(1000 * kFrameSize);
-    EXPECT_EQ(in.Read(buffer.data(), 300), SampleCount(300));
-    EXPECT_EQ(Bytes(buffer.begin(), buffer.begin() + 1200), FramesOfFile(100, 300));
-    in.SetReadPosition(750);
-    EXPECT_EQ(in.Read(buffer.data(), 100), SampleCount(50));
-    EXPECT_EQ(Bytes(buffer.begin(), buffer.begin() + 200), FramesOfFile(850, 50));
-    EXPECT_EQ(in.GetReadPosition(), SampleCount(800));
-    EXPECT_EQ(in.Read(buffer.data(), 100), SampleCount(0));
-    for (auto [asked, got] :
-         {std::pair<std::int64_t, std::int64_t>{-5, 0}, {801, 800}, {400, 400}}) {
-      in.SetReadPosition(asked);
-      EXPECT_EQ(in.GetReadPosition(), SampleCount(got));
-    }
+  AudioInFile in(Bite(100, 900), FileLength{1000}, {kCachedCaching, true});
+  EXPECT_EQ(in.GetLengthInFrames(), SampleCount(800));
+  EXPECT_EQ(in.Read(buffer_.data(), 300), SampleCount(300));
+  EXPECT_EQ(Bytes(buffer_.begin(), buffer_.begin() + 1200), FramesOfFile(100, 300));
+  in.SetReadPosition(750);
+  EXPECT_EQ(in.Read(buffer_.data(), 100), SampleCount(50));
+  EXPECT_EQ(Bytes(buffer_.begin(), buffer_.begin() + 200), FramesOfFile(850, 50));
+  EXPECT_EQ(in.GetReadPosition(), SampleCount(800));
+  EXPECT_EQ(in.Read(buffer_.data(), 100), SampleCount(0));
+  for (auto [asked, got] : {std::pair<std::int64_t, std::int64_t>{-5, 0}, {801, 800}}) {
+    in.SetReadPosition(asked);
+    EXPECT_EQ(in.GetReadPosition(), SampleCount(got));
   }
+  for (auto [start, end] : {std::pair{-1, 10}, {10, 5}})
+    EXPECT_EQ(
+        ErrorOf([&] { AudioInFile bad(Bite(start, end), FileLength{1000}); })->GetIntErrorCode(),
+        kParamErr);
+  EXPECT_EQ(
+      ErrorOf([&] { AudioInFile bad(Bite(0, 9), FileLength{1000}, kSamp24); })->GetIntErrorCode(),
+      kParamErr);
 }
 
 TEST_F(AudioInFileTest, PreflightCutsRequestsAtTheDataEnd) {
-  // The file's length (FileLength 850) ends the stretch before its own end.
-  AudioInFile in(Bite(100, 900), FileLength{850});
-  struct Case {
-    std::int64_t start, frames, position, count;
-  };
-  const Case cases[] = {
-      {0, 10, 0, 40},    {-7, 10, 0, 40}, {740, 20, 2960, 40},   {750, 1, 3000, 0},
-      {760, 5, 3000, 0}, {10, -3, 40, 0}, {0, 1 << 30, 0, 3000}, {INT64_MAX / 2, 1, 3000, 0}};
-  for (const Case& c : cases) {
+  AudioInFile in(Bite(100, 900), FileLength{850});  // the file's length ends it first
+  const std::int64_t cases[][4] = {
+      {0, 10, 0, 40},  {-7, 10, 0, 40},       {740, 20, 2960, 40},        {750, 1, 3000, 0},
+      {10, -3, 40, 0}, {0, 1 << 30, 0, 3000}, {INT64_MAX / 2, 1, 3000, 0}};
+  for (const auto& c : cases) {
     std::int64_t position = -1, count = -1;
-    in.PreflightReadRequest(c.start, c.frames, position, count);
-    EXPECT_EQ(position, c.position) << c.start << " " << c.frames;
-    EXPECT_EQ(count, c.count) << c.start << " " << c.frames;
+    in.PreflightReadRequest(c[0], c[1], position, count);
+    EXPECT_EQ(position, c[2]) << c[0] << " " << c[1];
+    EXPECT_EQ(count, c[3]) << c[0] << " " << c[1];
   }
-  Bytes buffer(100 * kFrameSize);
-  EXPECT_EQ(in.OutOfOrderRead(buffer.data(), 745, 100), SampleCount(5));
-  EXPECT_EQ(Bytes(buffer.begin(), buffer.begin() + 20), FramesOfFile(845, 5));
+  EXPECT_EQ(in.OutOfOrderRead(buffer_.data(), 745, 100), SampleCount(5));
+  EXPECT_EQ(Bytes(buffer_.begin(), buffer_.begin() + 20), FramesOfFile(845, 5));
   EXPECT_EQ(in.GetReadPosition(), SampleCount(0));
 }
 
 TEST_F(AudioInFileTest, AFileCutWhileOpenGivesShortReads) {
   AudioInFile in(Bite(0, 1000), FileLength{1000}, {kUnbufferedCaching, false});
-  std::filesystem::resize_file(path_, kHeader + 600 * kFrameSize + 3);
-  Bytes buffer(1000 * kFrameSize);
+  std::filesystem::resize_file(path_, 44 + 600 * 4 + 3);
   in.SetReadPosition(500);
-  EXPECT_EQ(in.Read(buffer.data(), 300), SampleCount(100));
-  EXPECT_EQ(Bytes(buffer.begin(), buffer.begin() + 400), FramesOfFile(500, 100));
+  EXPECT_EQ(in.Read(buffer_.data(), 300), SampleCount(100));
+  EXPECT_EQ(Bytes(buffer_.begin(), buffer_.begin() + 400), FramesOfFile(500, 100));
   EXPECT_EQ(in.GetReadPosition(), SampleCount(1000));  // the data end
-  EXPECT_EQ(in.Read(buffer.data(), 10), SampleCount(0));
-  // Out of order the end of the file is an error.
-  EXPECT_EQ(ErrorOf([&] { (void)in.OutOfOrderRead(buffer.data(), 590, 20); })->GetIntErrorCode(),
+  EXPECT_EQ(in.Read(buffer_.data(), 10), SampleCount(0));
+  EXPECT_EQ(ErrorOf([&] { (void)in.OutOfOrderRead(buffer_.data(), 590, 20); })->GetIntErrorCode(),
             kEOFErr);
   EXPECT_EQ(in.CheckEndPosition(), SampleCount(600));
-  EXPECT_EQ(in.OutOfOrderRead(buffer.data(), 590, 20), SampleCount(10));
-  EXPECT_EQ(Bytes(buffer.begin(), buffer.begin() + 40), FramesOfFile(590, 10));
+  EXPECT_EQ(in.OutOfOrderRead(buffer_.data(), 590, 20), SampleCount(10));
 }
 
-TEST_F(AudioInFileTest, BadBitesAreRefused) {
-  struct Case {
-    std::int64_t start, end;
-    int bytesPerSample;
-  };
-  for (const Case c : {Case{-1, 10, 2}, {10, 5, 2}, {0, 10, 3}}) {
-    DSPSoundBiteSpec bite = Bite(c.start, c.end);
-    bite.mAttributes.mBytesPerSample = static_cast<std::int16_t>(c.bytesPerSample);
-    EXPECT_EQ(ErrorOf([&] { AudioInFile in(bite, FileLength{1000}); })->GetIntErrorCode(),
-              kParamErr);
-  }
-  EXPECT_EQ(
-      ErrorOf([&] { AudioInFile in(Bite(0, 10), FileLength{1000}, kSamp24); })->GetIntErrorCode(),
-      kParamErr);
-  AudioInFile asFloat(Bite(0, 10), FileLength{1000}, kSamp16);
-  EXPECT_EQ(asFloat.GetFormat().mSampleFormat, kSamp16);
-}
-
-class CountingMonitor : public AudioReadPerformanceMonitor {
- public:
+struct CountingMonitor : AudioReadPerformanceMonitor {
   void BytesCompleted(std::int64_t bytes) noexcept override { total += bytes; }
   std::atomic<std::int64_t> total{0};
 };
 
-TEST_F(AudioInFileTest, AsyncReadsSwapTellTheMonitorAndComplete) {
+TEST_F(AudioInFileTest, AsyncReadsTellTheMonitorAndSwap) {
   AudioInFile in(Bite(100, 900, false), FileLength{1000}, {kUnbufferedCaching, false});
-  ASSERT_TRUE(in.ShouldSwapBuffer());
+  EXPECT_TRUE(in.ShouldSwapBuffer());
+  for (auto [file, wanted, swap] : {std::tuple{true, true, false},
+                                    {true, false, true},
+                                    {false, true, true},
+                                    {false, false, false}}) {
+    in.SetByteSwappingBasedOnDesriedOutputByteOrder(file, wanted);
+    EXPECT_EQ(in.ShouldSwapBuffer(), swap);
+  }
+  in.SetByteSwappingBasedOnDesriedOutputByteOrder(false, true);
   auto monitor = std::make_shared<CountingMonitor>();
   in.SetPerformanceMonitor(monitor);
-  Bytes buffer(64 * kFrameSize);
-  for (auto [start, frames, expected] :
-       {std::tuple<std::int64_t, std::int64_t, std::int64_t>{0, 64, 64},
-        {790, 64, 10},
-        {900, 4, 0}}) {
+  for (auto [start, frames, got] : {std::tuple{0, 64, 64}, {790, 64, 10}, {900, 4, 0}}) {
     std::promise<std::pair<int, SampleCount>> done;
-    in.OutOfOrderReadAsync(buffer.data(), start, frames, [&](int status, SampleCount got) {
-      done.set_value({status, got});
+    in.OutOfOrderReadAsync(buffer_.data(), start, frames, [&](int status, SampleCount n) {
+      done.set_value({status, n});
     });
-    const auto [status, got] = done.get_future().get();
-    EXPECT_EQ(status, 0);
-    ASSERT_EQ(got, SampleCount(expected));
-    Bytes swapped = FramesOfFile(100 + start, expected);
-    AudioFile::ByteSwap16BitBuffer(swapped.data(), std::int64_t(swapped.size()));
-    EXPECT_EQ(Bytes(buffer.begin(), buffer.begin() + std::ptrdiff_t(swapped.size())), swapped);
+    EXPECT_EQ(done.get_future().get(), std::make_pair(0, SampleCount(got)));
+    EXPECT_EQ(Bytes(buffer_.begin(), buffer_.begin() + got * 4),
+              Swapped(FramesOfFile(100 + start, got), 2));
   }
-  EXPECT_EQ(monitor->total, 74 * kFrameSize);
+  EXPECT_EQ(monitor->total, 74 * 4);
 }
 
 }  // namespace

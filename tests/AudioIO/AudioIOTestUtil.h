@@ -1,30 +1,26 @@
 #pragma once
-// Shared by the audio I/O tests: a file driver over memory that enforces
-// what an unbuffered file enforces, and makers of WAVE and AIFF recordings.
+// Shared by the audio I/O tests: a memory file that refuses what an
+// unbuffered file refuses, recordings made through the formats, noise.
 
 #include <gtest/gtest.h>
 
-#include <cstdint>
 #include <cstring>
 #include <memory>
-#include <vector>
+#include <random>
 
 #include "SoundFileFormats/ChunkFileTestUtil.h"
 #include "tarn/Audio/AudioInFile.h"
 #include "tarn/Audio/AudioOutFile.h"
-#include "tarn/Audio/PlatformAudioFile.h"
 #include "tarn/Audio/SoundFileFormats/AIFFSoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/WAVESoundFileFormat.h"
 
 namespace tarn::test {
 
-// A file in memory. With `aligned`, every transfer whose buffer, count or
-// file pointer is not a multiple of 4096 fails (-36) and is counted, as an
-// unbuffered file would refuse it.
+// With `aligned`, a transfer whose buffer, count or file pointer is not a
+// multiple of 4096 fails (-36) and is counted in misaligned_.
 class MemoryDriver final : public IFileDriver {
  public:
-  explicit MemoryDriver(Bytes bytes, bool aligned) : bytes_(std::move(bytes)), aligned_(aligned) {}
-
+  MemoryDriver(Bytes bytes, bool aligned) : bytes_(std::move(bytes)), aligned_(aligned) {}
   bool NeedsAlignment() const noexcept override { return aligned_; }
   FileStatus SetFilePointer(std::uint64_t offset) noexcept override {
     pointer_ = offset;
@@ -35,71 +31,68 @@ class MemoryDriver final : public IFileDriver {
     return kFileOK;
   }
   FileStatus Write(const void* buffer, std::uint64_t count) noexcept override {
-    lastBuffer_ = buffer;
-    if (failWrites_ || Misaligned(buffer, count)) return kFileIOErr;
-    if (bytes_.size() < pointer_ + count) bytes_.resize(pointer_ + count);
+    if (Refused(buffer, count) || failWrites_) return kFileIOErr;
+    bytes_.resize(std::max<std::uint64_t>(bytes_.size(), pointer_ + count));
     std::memcpy(bytes_.data() + pointer_, buffer, count);
     pointer_ += count;
-    ++transfers_;
     return kFileOK;
   }
   FileResult Read(void* buffer, std::uint64_t count) noexcept override {
-    lastBuffer_ = buffer;
-    if (Misaligned(buffer, count)) return {kFileIOErr, 0};
-    const std::uint64_t have = pointer_ < bytes_.size() ? bytes_.size() - pointer_ : 0;
-    const std::uint64_t n = std::min(have, count);
+    if (Refused(buffer, count)) return {kFileIOErr, 0};
+    const std::uint64_t n =
+        std::min(count, bytes_.size() - std::min<std::uint64_t>(pointer_, bytes_.size()));
     if (n != 0) std::memcpy(buffer, bytes_.data() + pointer_, n);
     pointer_ += n;
-    ++transfers_;
-    return {n == count ? kFileOK : kFileEOFErr, static_cast<std::int64_t>(n)};
+    return {n == count ? kFileOK : kFileEOFErr, std::int64_t(n)};
   }
   FileStatus SetEndOfFile() noexcept override { return SetFileSize(pointer_); }
   FileStatus SetFileSize(std::uint64_t bytes) noexcept override {
     bytes_.resize(bytes);
     return kFileOK;
   }
-  FileResult GetFileSize() noexcept override {
-    return {kFileOK, static_cast<std::int64_t>(bytes_.size())};
-  }
+  FileResult GetFileSize() noexcept override { return {kFileOK, std::int64_t(bytes_.size())}; }
   FileStatus Flush() noexcept override { return kFileOK; }
 
   Bytes bytes_;
-  bool aligned_;
-  bool failWrites_ = false;
+  bool aligned_, failWrites_ = false;
   std::uint64_t pointer_ = 0;
-  int misaligned_ = 0;
-  int transfers_ = 0;
+  int misaligned_ = 0, transfers_ = 0;
   const void* lastBuffer_ = nullptr;
 
  private:
-  bool Misaligned(const void* buffer, std::uint64_t count) noexcept {
-    const bool bad = aligned_ && ((reinterpret_cast<std::uintptr_t>(buffer) | count | pointer_) &
-                                  (PlatformAudioFile::kBlockSize - 1)) != 0;
+  bool Refused(const void* buffer, std::uint64_t count) noexcept {
+    lastBuffer_ = buffer;
+    ++transfers_;
+    const auto bits = reinterpret_cast<std::uintptr_t>(buffer) | count | pointer_;
+    const bool bad = aligned_ && (bits & (PlatformAudioFile::kBlockSize - 1)) != 0;
     misaligned_ += bad;
     return bad;
   }
 };
 
 inline SoundFileAttributes Attributes(std::uint32_t type, int channels, SampleFormat format,
-                                      bool lsbFirst, double rate = 48000.0) {
+                                      bool lsbFirst) {
   SoundFileAttributes a;
   a.mFileType = type;
   a.mNumChannels = static_cast<std::int16_t>(channels);
-  a.mSampleRate = rate;
+  a.mSampleRate = 48000.0;
   a.mSampleFormat = format;
+  a.mBytesPerSample = static_cast<std::int16_t>(GetBytesPerSample(format));
+  a.mBytesPerFrame = a.mBytesPerSample * channels;
   a.mSamplesAreLSBFirst = lsbFirst;
   return a;
 }
 
-// A new, empty recording at `path`, and its format object.
-inline std::shared_ptr<SoundFileFormat> NewRecording(const std::filesystem::path& path,
-                                                     const SoundFileAttributes& asked) {
+// The format object of the file at `path`: a new, empty recording when
+// `asked` is given.
+inline std::shared_ptr<SoundFileFormat> FormatOf(const std::filesystem::path& path,
+                                                 std::optional<SoundFileAttributes> asked = {}) {
   std::shared_ptr<SoundFileFormat> format;
-  if (asked.mFileType == MakeRIFFType("AIFF") || asked.mFileType == MakeRIFFType("AIFC"))
+  if (path.extension() == ".aif")
     format = std::make_shared<AIFFSoundFileFormat>(SpecOf(path));
   else
     format = std::make_shared<WAVESoundFileFormat>(SpecOf(path));
-  (void)format->CreateFileOnDisk(asked, 0, true, {});
+  if (asked) (void)format->CreateFileOnDisk(*asked, 0, true, {});
   return format;
 }
 
@@ -108,6 +101,12 @@ inline Bytes Noise(std::size_t count, std::uint32_t seed = 1) {
   std::mt19937 random(seed);
   Bytes bytes(count);
   for (auto& b : bytes) b = static_cast<std::uint8_t>(random() >> 24);
+  return bytes;
+}
+
+inline Bytes Swapped(Bytes bytes, int sampleSize) {
+  for (std::size_t i = 0; i + sampleSize <= bytes.size(); i += sampleSize)
+    std::reverse(bytes.begin() + std::ptrdiff_t(i), bytes.begin() + std::ptrdiff_t(i + sampleSize));
   return bytes;
 }
 
