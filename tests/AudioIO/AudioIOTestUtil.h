@@ -18,56 +18,40 @@ namespace tarn::test {
 
 // With `aligned`, a transfer whose buffer, count or file pointer is not a
 // multiple of 4096 fails (-36) and is counted in misaligned_.
-class MemoryDriver final : public IFileDriver {
- public:
+struct MemoryDriver final : IFileDriver {
   MemoryDriver(Bytes bytes, bool aligned) : bytes_(std::move(bytes)), aligned_(aligned) {}
   bool NeedsAlignment() const noexcept override { return aligned_; }
-  FileStatus SetFilePointer(std::uint64_t offset) noexcept override {
-    pointer_ = offset;
-    return kFileOK;
-  }
-  FileStatus GetFilePointer(std::uint64_t& offset) noexcept override {
-    offset = pointer_;
-    return kFileOK;
-  }
+  FileStatus SetFilePointer(std::uint64_t at) noexcept override { return pointer_ = at, kFileOK; }
+  FileStatus GetFilePointer(std::uint64_t& at) noexcept override { return at = pointer_, kFileOK; }
   FileStatus Write(const void* buffer, std::uint64_t count) noexcept override {
     if (Refused(buffer, count) || failWrites_) return kFileIOErr;
     bytes_.resize(std::max<std::uint64_t>(bytes_.size(), pointer_ + count));
     std::memcpy(bytes_.data() + pointer_, buffer, count);
-    pointer_ += count;
-    return kFileOK;
+    return pointer_ += count, kFileOK;
   }
   FileResult Read(void* buffer, std::uint64_t count) noexcept override {
     if (Refused(buffer, count)) return {kFileIOErr, 0};
-    const std::uint64_t n =
-        std::min(count, bytes_.size() - std::min<std::uint64_t>(pointer_, bytes_.size()));
+    const std::uint64_t n = std::min(count, bytes_.size() - std::min(pointer_, bytes_.size()));
     if (n != 0) std::memcpy(buffer, bytes_.data() + pointer_, n);
     pointer_ += n;
     return {n == count ? kFileOK : kFileEOFErr, std::int64_t(n)};
   }
   FileStatus SetEndOfFile() noexcept override { return SetFileSize(pointer_); }
-  FileStatus SetFileSize(std::uint64_t bytes) noexcept override {
-    bytes_.resize(bytes);
-    return kFileOK;
-  }
+  FileStatus SetFileSize(std::uint64_t bytes) noexcept override { return bytes_.resize(bytes), 0; }
   FileResult GetFileSize() noexcept override { return {kFileOK, std::int64_t(bytes_.size())}; }
   FileStatus Flush() noexcept override { return kFileOK; }
+  bool Refused(const void* buffer, std::uint64_t count) noexcept {
+    lastBuffer_ = buffer;
+    const auto bits = reinterpret_cast<std::uintptr_t>(buffer) | count | pointer_;
+    const bool bad = aligned_ && (bits & (PlatformAudioFile::kBlockSize - 1)) != 0;
+    return misaligned_ += bad, bad;
+  }
 
   Bytes bytes_;
   bool aligned_, failWrites_ = false;
   std::uint64_t pointer_ = 0;
-  int misaligned_ = 0, transfers_ = 0;
+  int misaligned_ = 0;
   const void* lastBuffer_ = nullptr;
-
- private:
-  bool Refused(const void* buffer, std::uint64_t count) noexcept {
-    lastBuffer_ = buffer;
-    ++transfers_;
-    const auto bits = reinterpret_cast<std::uintptr_t>(buffer) | count | pointer_;
-    const bool bad = aligned_ && (bits & (PlatformAudioFile::kBlockSize - 1)) != 0;
-    misaligned_ += bad;
-    return bad;
-  }
 };
 
 inline SoundFileAttributes Attributes(std::uint32_t type, int channels, SampleFormat format,

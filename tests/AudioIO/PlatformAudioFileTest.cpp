@@ -99,7 +99,6 @@ TEST(PlatformAudioFile, AlignedTransfersGoStraightThroughAndThePositionIsOurOwn)
   EXPECT_EQ(file.SyncWrite(buffer.data, kB), kFileOK);
   EXPECT_EQ(memory->lastBuffer_, buffer.data);
   EXPECT_EQ(file.GetPosition(), 4 * kB);
-  EXPECT_EQ(memory->transfers_, 2);
   for (std::uint64_t at : {std::uint64_t{5}, std::uint64_t{1} << 62}) {
     file.SetPosition(at);
     EXPECT_EQ(file.GetPosition(), at);
