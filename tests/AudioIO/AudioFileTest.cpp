@@ -112,10 +112,11 @@ TEST_F(AudioInFileTest, StreamReadsStopAtTheStretchEnd) {
     in.SetReadPosition(asked);
     EXPECT_EQ(in.GetReadPosition(), SampleCount(got));
   }
-  for (auto [start, end] : {std::pair{-1, 10}, {10, 5}})
-    EXPECT_EQ(
-        ErrorOf([&] { AudioInFile bad(Bite(start, end), FileLength{1000}); })->GetIntErrorCode(),
-        kParamErr);
+  for (auto range : {std::pair{-1, 10}, {10, 5}})
+    EXPECT_EQ(ErrorOf([&] {
+                AudioInFile bad(Bite(range.first, range.second), FileLength{1000});
+              })->GetIntErrorCode(),
+              kParamErr);
   EXPECT_EQ(
       ErrorOf([&] { AudioInFile bad(Bite(0, 9), FileLength{1000}, kSamp24); })->GetIntErrorCode(),
       kParamErr);
