@@ -24,12 +24,6 @@ std::unique_ptr<AsyncAudioReader> SoundFileFormat::MakeReader(const TimeRangeOf<
                         file_);
 }
 
-std::unique_ptr<AudioReader> SoundFileFormat::MakeFloatingPointReader(
-    const TimeRangeOf<SampleCount>&, double) {
-  sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr,
-                        "floating-point audio readers are not available", file_);
-}
-
 std::shared_ptr<InterAudioWriter> SoundFileFormat::MakeWriter() {
   sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr, "audio writers are not available",
                         file_);
