@@ -35,12 +35,6 @@ std::unique_ptr<AsyncAudioReader> SoundFileFormat::MakeReader(const TimeRangeOf<
   return std::make_unique<AudioInFile>(bite, FileLength{GetLengthInFrames()});
 }
 
-std::unique_ptr<AudioReader> SoundFileFormat::MakeFloatingPointReader(
-    const TimeRangeOf<SampleCount>&, double) {
-  sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr,
-                        "floating-point audio readers are not available", file_);
-}
-
 std::shared_ptr<InterAudioWriter> SoundFileFormat::MakeWriter() {
   if (FormatRequiresExternalConversion())
     sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr,
