@@ -3,12 +3,24 @@
 // the sample size once per call and then runs a loop with fixed-size copies
 // (no per-sample calls or branches on the format).
 
+#include <algorithm>
 #include <cstddef>
 
 namespace tarn::chainimpl {
 
 // Frames per block of the chain's scratch buffers.
 inline constexpr std::size_t kBlockFrames = 4096;
+
+// Readers ask the file layer for about this many bytes at a time: an
+// unbuffered file is read straight from the disk, one transfer per request,
+// and small transfers would leave it waiting on the disk's latency.
+inline constexpr std::size_t kReadAheadBytes = std::size_t{1} << 20;
+
+// Frames per request to the file layer for frames of `frameBytes` bytes: at
+// least kBlockFrames, otherwise about kReadAheadBytes of them.
+[[nodiscard]] inline std::size_t ReadBlockFrames(std::size_t frameBytes) noexcept {
+  return std::max(kBlockFrames, kReadAheadBytes / std::max<std::size_t>(frameBytes, 1));
+}
 
 // Splits `frames` interleaved frames of `channels` samples of
 // `bytesPerSample` bytes into one buffer per channel, written from sample

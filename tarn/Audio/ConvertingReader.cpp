@@ -60,11 +60,13 @@ void ConvertingReader::ConvertInto(void* const* channels, std::size_t offset,
 
 SampleCount ConvertingReader::ReadFrames(void* const* channels, SampleCount start,
                                          SampleCount frames) {
-  Reserve(kBlockFrames);
+  const std::size_t block =
+      chainimpl::ReadBlockFrames(static_cast<std::size_t>(sourceBytes_) * scratchChannels_.size());
+  Reserve(block);
   std::int64_t done = 0;
   while (done < frames.AsLongLong()) {
     const std::int64_t want =
-        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(kBlockFrames));
+        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(block));
     const std::int64_t got =
         source_->OutOfOrderRead(scratchChannels_.data(), start + done, want).AsLongLong();
     if (got <= 0) break;

@@ -8,8 +8,6 @@
 
 namespace tarn {
 
-using chainimpl::kBlockFrames;
-
 DeinterleavingReader::DeinterleavingReader(std::unique_ptr<AsyncAudioReader> source)
     : source_(std::move(source)) {
   if (!source_) FailOSErr(kParamErr);
@@ -31,11 +29,12 @@ SampleCount DeinterleavingReader::ReadFrames(void* const* channels, SampleCount 
   const int numChannels = format_.mNumChannels;
   if (numChannels == 1) return source_->OutOfOrderRead(channels[0], start, frames);
   const std::size_t frameBytes = static_cast<std::size_t>(bytesPerSample_) * numChannels;
-  scratch_.resize(std::max(scratch_.size(), kBlockFrames * frameBytes));
+  const std::size_t block = chainimpl::ReadBlockFrames(frameBytes);
+  scratch_.resize(std::max(scratch_.size(), block * frameBytes));
   std::int64_t done = 0;
   while (done < frames.AsLongLong()) {
     const std::int64_t want =
-        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(kBlockFrames));
+        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(block));
     const std::int64_t got =
         source_->OutOfOrderRead(scratch_.data(), start + done, want).AsLongLong();
     if (got <= 0) break;

@@ -8,8 +8,6 @@
 
 namespace tarn {
 
-using chainimpl::kBlockFrames;
-
 MonoSummingReader::MonoSummingReader(std::unique_ptr<AudioReader> source)
     : source_(std::move(source)) {
   if (!source_) FailOSErr(kParamErr);
@@ -37,13 +35,15 @@ void MonoSummingReader::Reserve(std::size_t frames) {
 
 SampleCount MonoSummingReader::ReadFrames(void* const* channels, SampleCount start,
                                           SampleCount frames) {
-  Reserve(kBlockFrames);
-  auto* out = static_cast<float*>(channels[0]);
   const int numChannels = static_cast<int>(scratchChannels_.size());
+  const std::size_t block =
+      chainimpl::ReadBlockFrames(sizeof(float) * static_cast<std::size_t>(numChannels));
+  Reserve(block);
+  auto* out = static_cast<float*>(channels[0]);
   std::int64_t done = 0;
   while (done < frames.AsLongLong()) {
     const std::int64_t want =
-        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(kBlockFrames));
+        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(block));
     const std::int64_t got =
         source_->OutOfOrderRead(scratchChannels_.data(), start + done, want).AsLongLong();
     if (got <= 0) break;

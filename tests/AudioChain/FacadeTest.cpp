@@ -164,8 +164,9 @@ TEST(Facade, FlushLeavesACompleteFileAndRecordingsCanOutgrowRIFF) {
     }
     // A WAVE recording may grow to Wave64's limit: its format switches it
     // in place when RIFF's sizes run out.
-    if (t.type == MakeRIFFType("WAVE"))
+    if (t.type == MakeRIFFType("WAVE")) {
       EXPECT_GT(out.GetFileFormat()->GetMaxFrameCount(), SampleCount(std::int64_t{1} << 40));
+    }
     out.Close();
   }
 }
