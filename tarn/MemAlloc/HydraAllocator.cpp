@@ -121,19 +121,6 @@ inline void ZeroUserArea(uint8_t* p, std::size_t rounded) noexcept {
 #endif
 }
 
-// Starts bringing up to the first 256 bytes of a block of bytes bytes into
-// the cache for writing (a null block is ignored).
-inline void PrefetchForWrite(const uint8_t* block, uint64_t bytes) noexcept {
-#if defined(__GNUC__)
-  if (!block) return;
-  const uint64_t span = bytes < 256 ? bytes : 256;
-  for (uint64_t at = 0; at < span; at += 64) __builtin_prefetch(block + at, 1, 3);
-#else
-  (void)block;
-  (void)bytes;
-#endif
-}
-
 // What the bytes in front of a user pointer say about it.
 struct BlockInfo {
   uint32_t magic = 0;        // 0: not one of ours
@@ -408,13 +395,8 @@ void* BuddySystemSubAllocator::Allocate(std::size_t size) noexcept {
     const int c = kClasses.small[(rounded + kPrefixBytes + kBlockHeaderBytes) / 4];
     uint8_t* block = fQuick[c];
     if (block) [[likely]] {
-      uint8_t* const next = NextOf(block);
-      fQuick[c] = next;
+      fQuick[c] = NextOf(block);
       --fQuickCount[c];
-      // The next block of this class is handed out a while from now: have
-      // its first lines on the way by then (its link is read and its user
-      // area zeroed at once when it is taken).
-      PrefetchForWrite(next, kClasses.sizes[c]);
     } else {
       block = TakeBlock(c);
       if (!block) return nullptr;
