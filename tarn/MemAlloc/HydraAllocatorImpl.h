@@ -46,13 +46,15 @@ void SleepMilliseconds(unsigned milliseconds) noexcept;
 
 // ---- Operating-system chunks -------------------------------------------
 // A chunk of size bytes is preceded by a 16-byte header inside the same
-// mapping: word 0 (0 while pooled or owned by a buddy pool; the logical size
-// while it serves one large block) and word 1 (size). The whole mapping is
-// (size + 16) rounded up to the page size.
+// mapping: word 0 (kFreshChunk from its mapping until first taken: every
+// byte is still zero; then 0 while pooled or owned by a buddy pool, the
+// logical size while it serves one large block) and word 1 (size). The
+// whole mapping is (size + 16) rounded up to the page size.
 struct HydraChunkHeader {
   uint64_t logical;
   uint64_t size;
 };
+inline constexpr uint64_t kFreshChunk = ~uint64_t{0};
 static_assert(sizeof(HydraChunkHeader) == 16);
 inline HydraChunkHeader* ChunkHeaderOf(void* chunk) noexcept {
   return static_cast<HydraChunkHeader*>(chunk) - 1;
