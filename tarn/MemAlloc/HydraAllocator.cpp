@@ -128,9 +128,10 @@ struct BlockInfo {
 };
 
 // Reads the bytes in front of any pointer handed to Deallocate, which for a
-// foreign block are another allocator's header (a sanitizer's red zone).
+// foreign block are another allocator's header (a sanitizer's red zone, or
+// bytes a race detector knows as freed).
 #if defined(__clang__) || defined(__GNUC__)
-__attribute__((no_sanitize("address"), no_sanitize("hwaddress")))
+__attribute__((no_sanitize("address"), no_sanitize("hwaddress"), no_sanitize("thread")))
 #endif
 inline uint32_t
 Peek32(const uint8_t* at) noexcept {
