@@ -29,8 +29,6 @@
 // Usage: bench_AllocBench [--no-rss] [Google Benchmark flags]
 
 #include <dlfcn.h>
-#include <sys/resource.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -268,7 +266,10 @@ class QuietReporter : public benchmark::BenchmarkReporter {
 };
 
 // In a child started with --rss-child=<filter>: runs the benchmarks
-// matching filter (none for an empty one) for a fixed short time, quietly.
+// matching filter (none for an empty one) for a fixed short time, quietly,
+// then prints its peak resident kilobytes (the high-water mark of its own
+// address space, which a fork's rusage would not give: that counts the
+// parent's pages the child shared before it started again).
 int RunRssChild(const char* program, const std::string& filter) {
   if (!filter.empty()) {
     std::string f = "--benchmark_filter=^" + filter + "(/|$)";
@@ -280,28 +281,32 @@ int RunRssChild(const char* program, const std::string& filter) {
     QuietReporter quiet;
     benchmark::RunSpecifiedBenchmarks(&quiet);
   }
-  return 0;
+  FILE* status = std::fopen("/proc/self/status", "r");
+  if (!status) return 1;
+  char line[256];
+  long kb = -1;
+  while (std::fgets(line, sizeof line, status))
+    if (std::sscanf(line, "VmHWM: %ld kB", &kb) == 1) break;
+  std::fclose(status);
+  std::printf("%ld\n", kb);
+  return kb < 0 ? 1 : 0;
 }
 
 // Peak resident kilobytes of a fresh process (this program started again,
 // so that every allocator, the pool thread included, starts as in a real
-// program) that runs the benchmarks matching filter.
+// program) that runs the benchmarks matching filter; -1 on failure.
 long ChildPeakKB(const std::string& filter) {
+  char self[4096];
+  const ssize_t length = readlink("/proc/self/exe", self, sizeof self - 1);
+  if (length <= 0) return -1;
+  self[length] = 0;
+  const std::string command = std::string("'") + self + "' '--rss-child=" + filter + "'";
   std::fflush(stdout);
-  const pid_t pid = fork();
-  if (pid == 0) {
-    std::string self = "bench_AllocBench";
-    std::string arg = "--rss-child=" + filter;
-    char* args[] = {self.data(), arg.data(), nullptr};
-    execv("/proc/self/exe", args);
-    _exit(127);
-  }
-  if (pid < 0) return -1;
-  int status = 0;
-  rusage usage{};
-  if (wait4(pid, &status, 0, &usage) != pid || !WIFEXITED(status) || WEXITSTATUS(status) != 0)
-    return -1;
-  return usage.ru_maxrss;
+  FILE* child = popen(command.c_str(), "r");
+  if (!child) return -1;
+  long kb = -1;
+  if (std::fscanf(child, "%ld", &kb) != 1) kb = -1;
+  return pclose(child) == 0 ? kb : -1;
 }
 
 // Each workload with each allocator once more, each in a process of its
@@ -312,8 +317,9 @@ void ReportPeakResidentMemory() {
               "workload");
   for (const Api& api : gApis) std::printf(" %9s", api.name.c_str());
   std::printf("\n");
+  std::vector<std::vector<double>> table;  // MB per workload and allocator; -1: failed
   for (const std::string& stem : gStems) {
-    std::vector<double> mb;
+    std::vector<double>& mb = table.emplace_back();
     for (const Api& api : gApis) {
       const long kb = ChildPeakKB(stem + "_" + api.name);
       mb.push_back(kb < 0 ? -1.0 : static_cast<double>(kb > idle ? kb - idle : 0) / 1024.0);
@@ -321,10 +327,14 @@ void ReportPeakResidentMemory() {
     std::printf("%-18s", stem.c_str());
     for (double v : mb) std::printf(" %9.1f", v);
     std::printf("\n");
-    for (size_t k = 1; k < mb.size(); ++k)
-      if (mb[0] >= 0 && mb[k] >= 1.0)
-        tarn_bench::PrintRatio(stem + "(peakRSS)", gApis[k].name, mb[0] / mb[k]);
   }
+  // Ratios only against peers that needed at least 1 MB: below that the
+  // figures are mostly page-granular noise.
+  std::printf("\n");
+  for (size_t w = 0; w < table.size(); ++w)
+    for (size_t k = 1; k < gApis.size(); ++k)
+      if (table[w][0] >= 0 && table[w][k] >= 1.0)
+        tarn_bench::PrintRatio(gStems[w] + "(peakRSS)", gApis[k].name, table[w][0] / table[w][k]);
 }
 
 }  // namespace
