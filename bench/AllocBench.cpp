@@ -7,7 +7,9 @@
 //   SmallMany<Kind>:    the same with 4096 live blocks (about 2 MB, beyond
 //                       the caches: mostly a measure of memory misses).
 //   CrossThread<Kind>:  a producer allocates 16-1024-byte blocks and a
-//                       consumer thread frees every one of them.
+//                       consumer thread frees every one of them; they hand
+//                       blocks over in batches of 64 and sleep (not spin)
+//                       while waiting for each other.
 //   Larson<Kind>:       two threads each replacing random blocks in an array
 //                       of 1000 live blocks; after every round the arrays
 //                       change hands, so most frees are of the other
@@ -20,15 +22,21 @@
 // does not reserve for dlopen'ed libraries; the program re-runs itself once
 // with GLIBC_TUNABLES set to provide it.
 //
-// Usage: bench_AllocBench [Google Benchmark flags]
+// Afterwards every workload runs once more with every allocator, each in a
+// child process of its own, and the table of their peak resident memory
+// (beyond an idle child's) follows, with ratio lines "<Workload>(peakRSS)".
+//
+// Usage: bench_AllocBench [--no-rss] [Google Benchmark flags]
 
 #include <dlfcn.h>
 #include <unistd.h>
 
 #include <atomic>
+#include <condition_variable>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <mutex>
 #include <random>
 #include <string>
 #include <thread>
@@ -103,57 +111,106 @@ void Small(benchmark::State& state, const Api& api, bool zeroed) {
   state.SetItemsProcessed(state.iterations() * 1000);
 }
 
-// A single-producer single-consumer ring of pointers.
-class Handoff {
+// Hands blocks from a producer to a consumer in batches of 64 through a ring
+// of 16 batches guarded by a mutex and two condition variables. Either side
+// sleeps while it cannot go on (the producer when every batch is full, the
+// consumer when none is), and a sleeper is woken only once the ring is half
+// full (half empty) again, so that it wakes to a run of work instead of
+// one batch at a time. On a machine with few processors neither side burns
+// the other's time spinning or yielding, and the lock is taken twice per 64
+// blocks on each side: what remains is mostly the allocators' own work. The
+// ring is plain memory, so the hand-off itself allocates nothing.
+class BatchHandoff {
  public:
-  bool Put(void* p) {
-    const unsigned w = fWrite.load(std::memory_order_relaxed);
-    if (w - fRead.load(std::memory_order_acquire) == kSlots) return false;
-    fSlots[w % kSlots] = p;
-    fWrite.store(w + 1, std::memory_order_release);
+  static constexpr unsigned kBatch = 64;
+
+  // Producer: the batch to fill next; waits while every batch is full.
+  void** Acquire() {
+    std::unique_lock<std::mutex> hold(fMutex);
+    while (fWritten - fRead == kBatches) {
+      fProducerWaits = true;
+      fNotFull.wait(hold);
+      fProducerWaits = false;
+    }
+    return fSlots[fWritten % kBatches];
+  }
+  // Producer: hands over the acquired batch holding count blocks.
+  void Publish(unsigned count) {
+    bool wake;
+    {
+      std::lock_guard<std::mutex> hold(fMutex);
+      fFill[fWritten % kBatches] = count;
+      ++fWritten;
+      wake = fConsumerWaits && fWritten - fRead >= kBatches / 2;
+    }
+    if (wake) fNotEmpty.notify_one();
+  }
+  void Finish() {
+    {
+      std::lock_guard<std::mutex> hold(fMutex);
+      fDone = true;
+    }
+    fNotEmpty.notify_one();
+  }
+  // Consumer: the oldest batch and its count; false once finished and empty.
+  bool Take(void**& batch, unsigned& count) {
+    std::unique_lock<std::mutex> hold(fMutex);
+    while (fWritten == fRead && !fDone) {
+      fConsumerWaits = true;
+      fNotEmpty.wait(hold);
+      fConsumerWaits = false;
+    }
+    if (fWritten == fRead) return false;
+    batch = fSlots[fRead % kBatches];
+    count = fFill[fRead % kBatches];
     return true;
   }
-  void* Take() {
-    const unsigned r = fRead.load(std::memory_order_relaxed);
-    if (r == fWrite.load(std::memory_order_acquire)) return nullptr;
-    void* p = fSlots[r % kSlots];
-    fRead.store(r + 1, std::memory_order_release);
-    return p;
+  // Consumer: the taken batch may be filled again.
+  void Release() {
+    bool wake;
+    {
+      std::lock_guard<std::mutex> hold(fMutex);
+      ++fRead;
+      wake = fProducerWaits && fWritten - fRead <= kBatches / 2;
+    }
+    if (wake) fNotFull.notify_one();
   }
 
  private:
-  static constexpr unsigned kSlots = 1024;
-  void* fSlots[kSlots] = {};
-  alignas(64) std::atomic<unsigned> fWrite{0};
-  alignas(64) std::atomic<unsigned> fRead{0};
+  static constexpr unsigned kBatches = 16;
+  void* fSlots[kBatches][kBatch] = {};
+  unsigned fFill[kBatches] = {};
+  std::mutex fMutex;
+  std::condition_variable fNotEmpty, fNotFull;
+  // Guarded by fMutex. Invariant: 0 <= fWritten - fRead <= kBatches.
+  unsigned fWritten = 0, fRead = 0;
+  bool fProducerWaits = false, fConsumerWaits = false, fDone = false;
 };
 
 void CrossThread(benchmark::State& state, const Api& api, bool zeroed) {
   const auto& sizes = Sizes();
-  Handoff handoff;
-  std::atomic<bool> done{false};
+  BatchHandoff handoff;
   std::thread consumer([&] {
-    for (;;) {
-      if (void* p = handoff.Take()) {
-        api.free(p);
-      } else if (done.load()) {
-        while (void* q = handoff.Take()) api.free(q);
-        return;
-      } else {
-        std::this_thread::yield();
-      }
+    void** batch;
+    unsigned count;
+    while (handoff.Take(batch, count)) {
+      for (unsigned k = 0; k < count; ++k) api.free(batch[k]);
+      handoff.Release();
     }
   });
   std::size_t i = 0;
+  constexpr int kBatchesPerIteration = 160;
   for (auto _ : state) {
-    for (int k = 0; k < 10000; ++k) {
-      void* p = Get(api, zeroed, sizes[i++ & 4095]);
-      while (!handoff.Put(p)) std::this_thread::yield();
+    for (int k = 0; k < kBatchesPerIteration; ++k) {
+      void** batch = handoff.Acquire();
+      for (unsigned b = 0; b < BatchHandoff::kBatch; ++b)
+        batch[b] = Get(api, zeroed, sizes[i++ & 4095]);
+      handoff.Publish(BatchHandoff::kBatch);
     }
   }
-  done = true;
+  handoff.Finish();
   consumer.join();
-  state.SetItemsProcessed(state.iterations() * 10000);
+  state.SetItemsProcessed(state.iterations() * kBatchesPerIteration * BatchHandoff::kBatch);
 }
 
 void Larson(benchmark::State& state, const Api& api, bool zeroed) {
@@ -186,8 +243,12 @@ void Larson(benchmark::State& state, const Api& api, bool zeroed) {
   state.SetItemsProcessed(state.iterations() * 2 * kOps);
 }
 
+// The workloads in registration order, for the resident-memory pass.
+std::vector<std::string> gStems;
+
 void Register(const char* stem, void (*fn)(benchmark::State&, const Api&, bool), bool zeroed,
               bool threaded, long arg = -1) {
+  gStems.emplace_back(stem);
   for (const Api& api : gApis) {
     auto* b = benchmark::RegisterBenchmark(
         (std::string(stem) + "_" + api.name).c_str(),
@@ -195,6 +256,85 @@ void Register(const char* stem, void (*fn)(benchmark::State&, const Api&, bool),
     if (arg >= 0) b->Arg(arg);
     if (threaded) b->MeasureProcessCPUTime()->UseRealTime();
   }
+}
+
+// Swallows a child's results: only its resident memory is of interest.
+class QuietReporter : public benchmark::BenchmarkReporter {
+ public:
+  bool ReportContext(const Context&) override { return true; }
+  void ReportRuns(const std::vector<Run>&) override {}
+};
+
+// In a child started with --rss-child=<filter>: runs the benchmarks
+// matching filter (none for an empty one) for a fixed short time, quietly,
+// then prints its peak resident kilobytes (the high-water mark of its own
+// address space, which a fork's rusage would not give: that counts the
+// parent's pages the child shared before it started again).
+int RunRssChild(const char* program, const std::string& filter) {
+  if (!filter.empty()) {
+    std::string f = "--benchmark_filter=^" + filter + "(/|$)";
+    std::string t = "--benchmark_min_time=0.2";
+    std::string p = program;
+    char* args[] = {p.data(), f.data(), t.data(), nullptr};
+    int n = 3;
+    benchmark::Initialize(&n, args);
+    QuietReporter quiet;
+    benchmark::RunSpecifiedBenchmarks(&quiet);
+  }
+  FILE* status = std::fopen("/proc/self/status", "r");
+  if (!status) return 1;
+  char line[256];
+  long kb = -1;
+  while (std::fgets(line, sizeof line, status))
+    if (std::sscanf(line, "VmHWM: %ld kB", &kb) == 1) break;
+  std::fclose(status);
+  std::printf("%ld\n", kb);
+  return kb < 0 ? 1 : 0;
+}
+
+// Peak resident kilobytes of a fresh process (this program started again,
+// so that every allocator, the pool thread included, starts as in a real
+// program) that runs the benchmarks matching filter; -1 on failure.
+long ChildPeakKB(const std::string& filter) {
+  char self[4096];
+  const ssize_t length = readlink("/proc/self/exe", self, sizeof self - 1);
+  if (length <= 0) return -1;
+  self[length] = 0;
+  const std::string command = std::string("'") + self + "' '--rss-child=" + filter + "'";
+  std::fflush(stdout);
+  FILE* child = popen(command.c_str(), "r");
+  if (!child) return -1;
+  long kb = -1;
+  if (std::fscanf(child, "%ld", &kb) != 1) kb = -1;
+  return pclose(child) == 0 ? kb : -1;
+}
+
+// Each workload with each allocator once more, each in a process of its
+// own: the peak resident memory it needed beyond an idle child's, in MB.
+void ReportPeakResidentMemory() {
+  const long idle = ChildPeakKB("");
+  std::printf("\nPeak resident memory, MB beyond an idle process (each run alone):\n%-18s",
+              "workload");
+  for (const Api& api : gApis) std::printf(" %9s", api.name.c_str());
+  std::printf("\n");
+  std::vector<std::vector<double>> table;  // MB per workload and allocator; -1: failed
+  for (const std::string& stem : gStems) {
+    std::vector<double>& mb = table.emplace_back();
+    for (const Api& api : gApis) {
+      const long kb = ChildPeakKB(stem + "_" + api.name);
+      mb.push_back(kb < 0 ? -1.0 : static_cast<double>(kb > idle ? kb - idle : 0) / 1024.0);
+    }
+    std::printf("%-18s", stem.c_str());
+    for (double v : mb) std::printf(" %9.1f", v);
+    std::printf("\n");
+  }
+  // Ratios only against peers that needed at least 1 MB: below that the
+  // figures are mostly page-granular noise.
+  std::printf("\n");
+  for (size_t w = 0; w < table.size(); ++w)
+    for (size_t k = 1; k < gApis.size(); ++k)
+      if (table[w][0] >= 0 && table[w][k] >= 1.0)
+        tarn_bench::PrintRatio(gStems[w] + "(peakRSS)", gApis[k].name, table[w][0] / table[w][k]);
 }
 
 }  // namespace
@@ -217,5 +357,19 @@ int main(int argc, char** argv) {
   Register("CrossThreadCalloc", &CrossThread, true, true);
   Register("LarsonMalloc", &Larson, false, true);
   Register("LarsonCalloc", &Larson, true, true);
-  return tarn_bench::RunWithRatios(argc, argv);
+  if (argc == 2 && std::strncmp(argv[1], "--rss-child=", 12) == 0)
+    return RunRssChild(argv[0], argv[1] + 12);
+  // --no-rss leaves out the resident-memory pass.
+  bool rss = true;
+  for (int i = 1; i < argc; ++i) {
+    if (std::strcmp(argv[i], "--no-rss") == 0) {
+      rss = false;
+      for (int k = i; k < argc; ++k) argv[k] = argv[k + 1];
+      --argc;
+      break;
+    }
+  }
+  const int status = tarn_bench::RunWithRatios(argc, argv);
+  if (rss) ReportPeakResidentMemory();
+  return status;
 }

@@ -17,6 +17,7 @@
 #include <string>
 #include <vector>
 
+#include "RatioReporter.h"
 #include "tarn/Audio/BufConverter.h"
 #include "tarn/Audio/ConverterKernelsImpl.h"
 
@@ -222,6 +223,15 @@ int main() {
                   r.blockOurs / r.blockPeer, Msps(kRun, r.runPeer), r.runOurs / r.runPeer);
     } else {
       std::printf(" |\n");
+    }
+  }
+  std::printf("\n");
+  for (const Row& r : rows) {
+    tarn_bench::PrintRatio(r.pair + " (block)", "memcpy", r.blockOurs / r.blockCopy);
+    tarn_bench::PrintRatio(r.pair + " (run)", "memcpy", r.runOurs / r.runCopy);
+    if (r.blockPeer > 0) {
+      tarn_bench::PrintRatio(r.pair + " (block)", "libsndfile", r.blockOurs / r.blockPeer);
+      tarn_bench::PrintRatio(r.pair + " (run)", "libsndfile", r.runOurs / r.runPeer);
     }
   }
   return 0;

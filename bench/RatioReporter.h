@@ -1,7 +1,13 @@
-// A Google Benchmark reporter that, after the usual table, prints one ratio
-// line per peer: benchmarks are named "<Case>_Tarn" for ours and
-// "<Case>_<Peer>" for each peer, and the ratio is ours / peer in processor
-// time (steadier than wall time on a shared machine).
+// The one line format in which every benchmark reports a ratio,
+//
+//   <case> ours / <peer> = <ratio>
+//
+// (bench/run gathers these lines from all benchmarks into one table), and a
+// Google Benchmark reporter that, after the usual table, prints one such line
+// per peer: benchmarks are named "<Case>_Tarn" for ours and "<Case>_<Peer>"
+// for each peer, and the ratio is ours / peer in processor time (steadier
+// than wall time on a shared machine). Benchmarks that time by hand call
+// PrintRatio for each figure they compare.
 #pragma once
 
 #include <benchmark/benchmark.h>
@@ -12,6 +18,11 @@
 #include <vector>
 
 namespace tarn_bench {
+
+// Prints one ratio line; what and peer must not contain " ours / " or " = ".
+inline void PrintRatio(const std::string& what, const std::string& peer, double ratio) {
+  std::printf("%-16s ours / %-24s = %.2f\n", what.c_str(), peer.c_str(), ratio);
+}
 
 class RatioReporter : public benchmark::ConsoleReporter {
  public:
@@ -29,8 +40,7 @@ class RatioReporter : public benchmark::ConsoleReporter {
       const std::string stem = name.substr(0, at + 1);
       for (const auto& [peer, theirs] : times_)
         if (peer != name && peer.rfind(stem, 0) == 0)
-          std::printf("%-16s ours / %-24s = %.2f\n", name.substr(0, at).c_str(),
-                      peer.substr(stem.size()).c_str(), ours / theirs);
+          PrintRatio(name.substr(0, at), peer.substr(stem.size()), ours / theirs);
     }
   }
 

@@ -15,6 +15,7 @@
 #include <string>
 #include <vector>
 
+#include "RatioReporter.h"
 #include "tarn/Basics/Endian.h"
 #include "tarn/FileSystem/FileSpecification.h"
 #include "tarn/Streams/CFileStream.h"
@@ -204,5 +205,9 @@ int main(int argc, char** argv) {
               fileRead / peerRead);
   std::printf("ratio CHandleStream / iostream: write %.2f  read %.2f\n", handleWrite / peerWrite,
               handleRead / peerRead);
+  tarn_bench::PrintRatio("CFileStreamWrite", "iostream", fileWrite / peerWrite);
+  tarn_bench::PrintRatio("CFileStreamRead", "iostream", fileRead / peerRead);
+  tarn_bench::PrintRatio("CHandleStreamWrite", "iostream", handleWrite / peerWrite);
+  tarn_bench::PrintRatio("CHandleStreamRead", "iostream", handleRead / peerRead);
   return 0;
 }

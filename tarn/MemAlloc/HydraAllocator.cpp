@@ -128,9 +128,10 @@ struct BlockInfo {
 };
 
 // Reads the bytes in front of any pointer handed to Deallocate, which for a
-// foreign block are another allocator's header (a sanitizer's red zone).
+// foreign block are another allocator's header (a sanitizer's red zone, or
+// bytes a race detector knows as freed).
 #if defined(__clang__) || defined(__GNUC__)
-__attribute__((no_sanitize("address"), no_sanitize("hwaddress")))
+__attribute__((no_sanitize("address"), no_sanitize("hwaddress"), no_sanitize("thread")))
 #endif
 inline uint32_t
 Peek32(const uint8_t* at) noexcept {
@@ -155,9 +156,19 @@ inline BlockInfo Inspect(void* p) noexcept {
 }
 
 // Buddy block header: class (bits 0-7), free (bit 8), side (bits 9-10),
-// remembered side (bits 11-12), logical size / 4 (bits 16-31).
+// remembered side (bits 11-12), clean (bit 13, free blocks only), logical
+// size / 4 (bits 16-31, live blocks only).
+//
+// Clean: every byte of the block from +24 on is zero. Memory fresh from the
+// system is zero, and a free block's own header and list links lie within
+// its first 24 bytes; so the root block of a fresh chunk is clean, and both
+// halves of a clean block are clean (each half's region was zero beyond the
+// parent's first 24 bytes). Handing out a clean block zeroes only the list
+// link inside its user area instead of the whole area. Blocks freed after
+// use, merged, or kept on the quick lists are never clean.
 enum Side : uint32_t { kRoot = 0, kLeft = 1, kRight = 2 };
 constexpr uint32_t kFreeBit = 1u << 8;
+constexpr uint32_t kCleanBit = 1u << 13;
 
 inline uint32_t MakeHeader(int c, bool isFree, uint32_t side, uint32_t memory) noexcept {
   return static_cast<uint32_t>(c) | (isFree ? kFreeBit : 0) | (side << 9) | (memory << 11);
@@ -167,6 +178,7 @@ inline bool HeaderFree(uint32_t h) noexcept { return (h & kFreeBit) != 0; }
 inline uint32_t HeaderSide(uint32_t h) noexcept { return (h >> 9) & 3; }
 inline uint32_t HeaderMemory(uint32_t h) noexcept { return (h >> 11) & 3; }
 inline uint64_t HeaderLogical(uint32_t h) noexcept { return static_cast<uint64_t>(h >> 16) * 4; }
+inline uint32_t HeaderClean(uint32_t h) noexcept { return h & kCleanBit; }
 
 // Free-list links of a free block (blocks are at least 32 bytes).
 inline uint8_t*& NextOf(uint8_t* block) noexcept { return *reinterpret_cast<uint8_t**>(block + 8); }
@@ -269,7 +281,10 @@ bool BuddySystemSubAllocator::Grow() noexcept {
     auto* chunk = static_cast<uint8_t*>(pool.Take(kClasses.sizes[c] + 16));
     if (!chunk) continue;
     uint8_t* root = chunk + 16;
-    Store32(root, MakeHeader(c, true, kRoot, kRoot));
+    HydraChunkHeader* ch = ChunkHeaderOf(chunk);
+    const bool fresh = ch->logical == kFreshChunk;
+    ch->logical = 0;
+    Store32(root, MakeHeader(c, true, kRoot, kRoot) | (fresh ? kCleanBit : 0));
     ListPush(c, root);
     ++fSpareChunks;
     return true;
@@ -327,8 +342,8 @@ uint8_t* BuddySystemSubAllocator::TakeBlock(int c) noexcept {
     const uint32_t h = Load32(block);
     uint8_t* left = block;
     uint8_t* right = block + kClasses.sizes[k - 1];
-    Store32(left, MakeHeader(k - 1, true, kLeft, HeaderSide(h)));
-    Store32(right, MakeHeader(k - 2, true, kRight, HeaderMemory(h)));
+    Store32(left, MakeHeader(k - 1, true, kLeft, HeaderSide(h)) | HeaderClean(h));
+    Store32(right, MakeHeader(k - 2, true, kRight, HeaderMemory(h)) | HeaderClean(h));
     // Keep the smaller part that can still serve c; list the other.
     if (k - 2 >= 0 && CanServe(k - 2, c)) {
       ListPush(k - 1, left);
@@ -420,7 +435,11 @@ inline void* BuddySystemSubAllocator::HandOut(uint8_t* block, int c, std::size_t
   StoreOwner(block + 4, this);
   Store32(block + 12, kBuddyMagic);
   uint8_t* user = block + 16;
-  ZeroUserArea(user, rounded);
+  if (HeaderClean(h)) [[unlikely]] {
+    std::memset(user, 0, 8);  // PrevOf's link; the rest is zero already
+  } else {
+    ZeroUserArea(user, rounded);
+  }
   Add(bytesInUse, static_cast<int64_t>(kClasses.sizes[c]));
   Add(logicalBytes, static_cast<int64_t>(rounded));
   Add(blocks, 1);
@@ -431,12 +450,15 @@ void* BuddySystemSubAllocator::AllocateLarge(std::size_t rounded) noexcept {
   auto* chunk = static_cast<uint8_t*>(HydraAllocator::GlobalPool().Take(rounded + kPrefixBytes));
   if (!chunk) return nullptr;
   HydraChunkHeader* ch = ChunkHeaderOf(chunk);
+  const bool fresh = ch->logical == kFreshChunk;
   ch->logical = rounded;
   StoreOwner(chunk, this);
   Store32(chunk + 8, kLargeMagic);
   Store32(chunk + 12, kPadMarker);
   uint8_t* user = chunk + 16;
-  std::memset(user, 0, rounded);
+  // A chunk fresh from the system is zero: leaving it untouched also leaves
+  // its pages unmapped until the caller writes to them.
+  if (!fresh) std::memset(user, 0, rounded);
   ++fLargeBlocks;
   Add(bytesInUse, static_cast<int64_t>(ch->size));
   Add(logicalBytes, static_cast<int64_t>(rounded));
@@ -484,7 +506,7 @@ inline void BuddySystemSubAllocator::FreeBuddyLocal(uint8_t* user) noexcept {
 }
 
 void BuddySystemSubAllocator::DrainRemoteFrees() noexcept {
-  void* node = DetachAtomic(&remoteFrees);
+  void* node = std::atomic_ref<void*>(remoteFrees.top).exchange(nullptr, std::memory_order_acquire);
   while (node) {
     void* next = AtomicStackNext(node);
     FreeLocal(node);
@@ -547,7 +569,7 @@ void* HydraGlobalPool::MapChunk(std::size_t size) noexcept {
   const std::size_t bytes = (size + sizeof(HydraChunkHeader) + page - 1) / page * page;
   auto* base = static_cast<HydraChunkHeader*>(hydra_os::MapPages(bytes));
   if (!base) return nullptr;
-  base->logical = 0;
+  base->logical = kFreshChunk;
   base->size = size;
   fOSBytes.fetch_add(bytes);
   return base + 1;
@@ -759,7 +781,7 @@ void HydraAllocator::Deallocate(void* p) noexcept {
   if (owner == self) {
     self->FreeLocal(p);
   } else {
-    EnqueueAtomic(&owner->remoteFrees, p);
+    owner->PushRemoteFree(p);
   }
   if (self && self->HasRemoteFrees()) self->DrainRemoteFrees();
 }

@@ -46,13 +46,15 @@ void SleepMilliseconds(unsigned milliseconds) noexcept;
 
 // ---- Operating-system chunks -------------------------------------------
 // A chunk of size bytes is preceded by a 16-byte header inside the same
-// mapping: word 0 (0 while pooled or owned by a buddy pool; the logical size
-// while it serves one large block) and word 1 (size). The whole mapping is
-// (size + 16) rounded up to the page size.
+// mapping: word 0 (kFreshChunk from its mapping until first taken: every
+// byte is still zero; then 0 while pooled or owned by a buddy pool, the
+// logical size while it serves one large block) and word 1 (size). The
+// whole mapping is (size + 16) rounded up to the page size.
 struct HydraChunkHeader {
   uint64_t logical;
   uint64_t size;
 };
+inline constexpr uint64_t kFreshChunk = ~uint64_t{0};
 static_assert(sizeof(HydraChunkHeader) == 16);
 inline HydraChunkHeader* ChunkHeaderOf(void* chunk) noexcept {
   return static_cast<HydraChunkHeader*>(chunk) - 1;
@@ -139,7 +141,12 @@ class alignas(16) BuddySystemSubAllocator {
   // (the object is 16-byte aligned), so that those writes do not bounce the
   // line between the threads.
   unsigned char padBeforeRemoteFrees[56] = {};
-  AtomicStackHead remoteFrees;  // user pointers pushed by other threads
+  // User pointers pushed by other threads, linked through their first
+  // words. Only ever pushed onto (any thread) and taken whole (the owner,
+  // or the pool thread for an orphan), never popped one by one: no ABA can
+  // arise, so both are single 8-byte atomic operations on the top word and
+  // the generation word stays unused.
+  AtomicStackHead remoteFrees;
   unsigned char padAfterRemoteFrees[48] = {};
 
   BuddySystemSubAllocator() noexcept;
@@ -159,6 +166,18 @@ class alignas(16) BuddySystemSubAllocator {
   // Resizes a block of this sub-allocator in place when it fits; null when
   // it does not (p untouched).
   [[nodiscard]] void* ResizeInPlace(void* user, std::size_t size) noexcept;
+  // Another thread frees user (a block of this sub-allocator).
+  void PushRemoteFree(void* user) noexcept {
+    std::atomic_ref<void*> top(remoteFrees.top);
+    std::atomic_ref<void*> link(*static_cast<void**>(user));
+    void* seen = top.load(std::memory_order_relaxed);
+    do {
+      link.store(seen, std::memory_order_relaxed);
+    } while (!top.compare_exchange_weak(seen, user, std::memory_order_release,
+                                        std::memory_order_relaxed));
+  }
+  // Frees every block other threads have pushed so far, taken in one
+  // exchange.
   void DrainRemoteFrees() noexcept;
   [[nodiscard]] bool HasRemoteFrees() noexcept {
     return std::atomic_ref<void*>(remoteFrees.top).load(std::memory_order_relaxed) != nullptr;

@@ -22,6 +22,7 @@
 #include <type_traits>
 #include <utility>
 
+#include "tarn/Errors/Fail.h"
 #include "tarn/Errors/TarnError.h"
 #include "tarn/Threads/TarnSemaphore.h"
 
@@ -63,13 +64,20 @@ class TarnPromise {
   // cancelled" for a dropped job, or the TarnError the job raised).
   R Get() {
     Wait();
-    if (!fSucceeded) throw fError;
+    if (!fSucceeded) throw GetError();
     if constexpr (!std::is_void_v<R>) return *fValue;
   }
   // After completion: true when the job ran to its end.
   [[nodiscard]] bool Succeeded() const noexcept { return fSucceeded; }
-  // After completion of a failed or cancelled job: its error.
-  [[nodiscard]] const TarnError& GetError() const noexcept { return fError; }
+  // After completion of a failed or cancelled job: its error (the
+  // out-of-memory error when there was no memory left to keep it). Before
+  // completion, and after success, a default TarnError.
+  [[nodiscard]] const TarnError& GetError() const noexcept {
+    static const TarnError kNone;
+    static const TarnError kOutOfMemory(kMemFullErr);
+    if (fError) return *fError;
+    return fDone.load(std::memory_order_acquire) && !fSucceeded ? kOutOfMemory : kNone;
+  }
 
   // Completion, called once by the job.
   template <class... V>
@@ -78,8 +86,12 @@ class TarnPromise {
     fSucceeded = true;
     Complete();
   }
-  void Fail(const TarnError& error) {
-    fError = error;
+  void Fail(const TarnError& error) noexcept {
+    try {
+      fError = std::make_unique<TarnError>(error);
+    } catch (...) {
+      // GetError reports the lack of memory instead.
+    }
     fSucceeded = false;
     Complete();
   }
@@ -91,9 +103,10 @@ class TarnPromise {
     fSignal.Signal();
   }
 
-  // Written once by the completing thread before fDone is set.
+  // Written once by the completing thread before fDone is set. The error
+  // lives apart: it is large, and most jobs never need it.
   bool fSucceeded = false;
-  TarnError fError;
+  std::unique_ptr<TarnError> fError;
   std::optional<std::conditional_t<std::is_void_v<R>, Nothing, R>> fValue;
   std::atomic<bool> fDone{false};
   TarnBinarySemaphore fSignal{false};

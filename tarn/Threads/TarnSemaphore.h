@@ -2,13 +2,15 @@
 // units), TarnBinarySemaphore (at most one unit), WithBinarySemaphore (scope
 // guard), and the never-blocking CountingSemaphore and TestAndSetSemaphore.
 //
-// The blocking classes are handles over a private implementation; any
+// The blocking classes are handles over a private implementation (on Linux
+// TarnBinarySemaphore needs none: it sleeps on its own state word); any
 // thread may signal, any thread may wait. Nothing here throws or reports
 // errors: a unit signalled past the maximum is silently lost, and a timed
 // wait that fails for any reason reports kTimedOut. Using an object whose
 // implementation could not be created is an assertion failure ("px != 0").
 #pragma once
 
+#include <atomic>
 #include <cstdint>
 
 #include "tarn/Threads/TarnAtomic.h"
@@ -47,12 +49,20 @@ class TarnBinarySemaphore {
   TarnBinarySemaphore(const TarnBinarySemaphore&) = delete;
   TarnBinarySemaphore& operator=(const TarnBinarySemaphore&) = delete;
 
-  void Signal() noexcept;  // a second Signal before a Wait is lost
+  // A second Signal before a Wait is lost. Without a sleeping waiter this is
+  // one atomic operation on Linux (no system call).
+  void Signal() noexcept;
+  // Takes the unit, sleeping until there is one. Takes it without a system
+  // call on Linux when it is there already.
   void Wait() noexcept;
   // Waits at most nanoseconds / 1,000,000 whole milliseconds.
   WakeReason TimedWait(uint64_t nanoseconds) noexcept;
 
  private:
+  // Where the platform can sleep on an address (Linux futexes), the whole
+  // state: bit 0 is the unit, the bits above count the threads asleep in a
+  // wait (state >> 1 == sleepers). Unused where fImpl holds a system object.
+  std::atomic<uint32_t> fState;
   TarnBinarySemaphoreImpl* fImpl;
 };
 

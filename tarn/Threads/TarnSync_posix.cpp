@@ -1,9 +1,15 @@
 // POSIX system primitives behind the lock and semaphore handles: pthread
 // mutexes, reader/writer locks, and a counted signal (mutex + condition
-// variable on the monotonic clock) that serves as semaphore, binary
-// semaphore and auto-reset event.
+// variable on the monotonic clock) that serves as semaphore and auto-reset
+// event. On Linux the binary semaphore is a futex word instead; elsewhere it
+// is a counted signal of at most one unit.
 #include <pthread.h>
 #include <time.h>
+#ifdef __linux__
+#include <linux/futex.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+#endif
 
 #include <cerrno>
 #include <cstdint>
@@ -201,12 +207,108 @@ TarnSemaphore::WakeReason TarnSemaphore::timed_wait(uint32_t microseconds) noexc
   return Demand(fImpl)->TimedWait(microseconds / 1000) ? kSignalled : kTimedOut;
 }
 
+#ifdef __linux__
+
+// The binary semaphore sleeps on its state word (see the header): taking an
+// available unit and signalling without sleepers are single compare-and-swap
+// operations; only a thread that finds no unit enters the kernel, after
+// counting itself as a sleeper, and a signal wakes one sleeper when it sees
+// any. All ordering between signaller and waiter comes from the atomic
+// operations on the word; the futex calls only put threads to sleep and wake
+// them (a wake-up may be spurious or go to a thread that then finds the unit
+// gone; each sleeper re-checks the word).
+
+namespace {
+
+constexpr uint32_t kUnit = 1;
+constexpr uint32_t kSleeper = 2;
+
+static_assert(sizeof(std::atomic<uint32_t>) == sizeof(uint32_t) &&
+              std::atomic<uint32_t>::is_always_lock_free);
+
+uint32_t* FutexWord(std::atomic<uint32_t>& state) noexcept {
+  return reinterpret_cast<uint32_t*>(&state);
+}
+
+// Sleeps while the word holds expected, at most until the absolute
+// monotonic deadline (none when null); true when the deadline passed.
+bool FutexWait(std::atomic<uint32_t>& state, uint32_t expected, const timespec* deadline) noexcept {
+  const long result = syscall(SYS_futex, FutexWord(state), FUTEX_WAIT_BITSET | FUTEX_PRIVATE_FLAG,
+                              expected, deadline, nullptr, FUTEX_BITSET_MATCH_ANY);
+  return result != 0 && errno == ETIMEDOUT;
+}
+
+void FutexWakeOne(std::atomic<uint32_t>& state) noexcept {
+  syscall(SYS_futex, FutexWord(state), FUTEX_WAKE | FUTEX_PRIVATE_FLAG, 1, nullptr, nullptr, 0);
+}
+
+// Takes the unit if it is there; s is the last value seen and is refreshed.
+bool TryTakeUnit(std::atomic<uint32_t>& state, uint32_t& s, uint32_t leaving) noexcept {
+  while ((s & kUnit) != 0) {
+    if (state.compare_exchange_weak(s, (s - leaving) & ~kUnit, std::memory_order_acquire,
+                                    std::memory_order_relaxed)) {
+      return true;
+    }
+  }
+  return false;
+}
+
+// Takes the unit, sleeping until it comes or the deadline (if any) passes;
+// true when taken.
+bool TakeUnit(std::atomic<uint32_t>& state, const timespec* deadline) noexcept {
+  uint32_t s = state.load(std::memory_order_relaxed);
+  for (;;) {
+    if (TryTakeUnit(state, s, 0)) return true;
+    if (state.compare_exchange_weak(s, s + kSleeper, std::memory_order_relaxed)) break;
+  }
+  s += kSleeper;
+  for (;;) {
+    const bool timedOut = FutexWait(state, s, deadline);
+    s = state.load(std::memory_order_relaxed);
+    if (TryTakeUnit(state, s, kSleeper)) return true;
+    if (timedOut) {
+      while (!state.compare_exchange_weak(s, s - kSleeper, std::memory_order_relaxed)) {
+        if (TryTakeUnit(state, s, kSleeper)) return true;
+      }
+      return false;
+    }
+  }
+}
+
+}  // namespace
+
+TarnBinarySemaphore::TarnBinarySemaphore(bool signalled)
+    : fState(signalled ? kUnit : 0), fImpl(nullptr) {}
+TarnBinarySemaphore::~TarnBinarySemaphore() = default;
+
+void TarnBinarySemaphore::Signal() noexcept {
+  uint32_t s = fState.load(std::memory_order_relaxed);
+  do {
+    if ((s & kUnit) != 0) return;  // at most one unit
+  } while (!fState.compare_exchange_weak(s, s | kUnit, std::memory_order_release,
+                                         std::memory_order_relaxed));
+  if (s >= kSleeper) FutexWakeOne(fState);
+}
+
+void TarnBinarySemaphore::Wait() noexcept { (void)TakeUnit(fState, nullptr); }
+
+TarnBinarySemaphore::WakeReason TarnBinarySemaphore::TimedWait(uint64_t nanoseconds) noexcept {
+  const auto milliseconds = static_cast<uint64_t>(static_cast<double>(nanoseconds) / 1000000.0);
+  uint32_t s = fState.load(std::memory_order_relaxed);
+  if (TryTakeUnit(fState, s, 0)) return kSignalled;
+  if (milliseconds == 0) return kTimedOut;
+  const timespec deadline = DeadlineAfterMilliseconds(milliseconds);
+  return TakeUnit(fState, &deadline) ? kSignalled : kTimedOut;
+}
+
+#else
+
 struct TarnBinarySemaphoreImpl : CountedSignal {
   explicit TarnBinarySemaphoreImpl(bool signalled) noexcept : CountedSignal(signalled ? 1 : 0, 1) {}
 };
 
 TarnBinarySemaphore::TarnBinarySemaphore(bool signalled)
-    : fImpl(NewValid<TarnBinarySemaphoreImpl>(signalled)) {}
+    : fState(0), fImpl(NewValid<TarnBinarySemaphoreImpl>(signalled)) {}
 TarnBinarySemaphore::~TarnBinarySemaphore() { delete fImpl; }
 void TarnBinarySemaphore::Signal() noexcept { Demand(fImpl)->Post(); }
 void TarnBinarySemaphore::Wait() noexcept { Demand(fImpl)->Wait(); }
@@ -214,6 +316,8 @@ TarnBinarySemaphore::WakeReason TarnBinarySemaphore::TimedWait(uint64_t nanoseco
   const auto milliseconds = static_cast<uint64_t>(static_cast<double>(nanoseconds) / 1000000.0);
   return Demand(fImpl)->TimedWait(milliseconds) ? kSignalled : kTimedOut;
 }
+
+#endif
 
 // --- TarnConditionVariable ---
 

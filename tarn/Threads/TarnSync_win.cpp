@@ -113,7 +113,7 @@ struct TarnBinarySemaphoreImpl : SemaphoreHandle {
 };
 
 TarnBinarySemaphore::TarnBinarySemaphore(bool signalled)
-    : fImpl(NewSemaphore<TarnBinarySemaphoreImpl>(signalled)) {}
+    : fState(0), fImpl(NewSemaphore<TarnBinarySemaphoreImpl>(signalled)) {}
 TarnBinarySemaphore::~TarnBinarySemaphore() { delete fImpl; }
 void TarnBinarySemaphore::Signal() noexcept { ReleaseSemaphore(Demand(fImpl)->handle, 1, nullptr); }
 void TarnBinarySemaphore::Wait() noexcept { WaitForSingleObject(Demand(fImpl)->handle, INFINITE); }

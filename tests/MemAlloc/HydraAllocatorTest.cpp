@@ -117,6 +117,47 @@ TEST(HydraAllocator, ZeroDistinctAlignedAndZeroFilledAfterReuse) {
   }
 }
 
+// Blocks carved from chunks fresh from the system skip most of the zero
+// fill, so a new thread (a new sub-allocator taking chunks from the pool)
+// carves whole chunks into every small size, writes each block full, and
+// checks that nothing it is handed later shows any earlier bytes; large
+// blocks, pooled-size ones and system-sized ones, likewise after reuse.
+TEST(HydraAllocator, FreshAndReusedChunksHandOutZeroes) {
+  std::thread([] {
+    std::vector<std::pair<void*, std::size_t>> live;
+    for (int round = 0; round < 3; ++round) {
+      for (std::size_t size = 1; size <= 1200; size += (size < 64 ? 1 : 29)) {
+        for (int copy = 0; copy < 6; ++copy) {
+          void* p = Heap().Allocate(size);
+          ASSERT_NE(p, nullptr);
+          ASSERT_TRUE(AllZero(p, size)) << size << " round " << round;
+          std::memset(p, 0x5A, size);
+          live.emplace_back(p, size);
+        }
+      }
+      // Free every other block, so the next round mixes reused blocks with
+      // blocks split from fresh and merged chunks.
+      std::vector<std::pair<void*, std::size_t>> kept;
+      for (std::size_t i = 0; i < live.size(); ++i) {
+        if (i % 2 == 0 || round == 2)
+          Heap().Deallocate(live[i].first);
+        else
+          kept.push_back(live[i]);
+      }
+      live.swap(kept);
+    }
+    for (std::size_t size : {std::size_t{45'000}, std::size_t{53'000}, std::size_t{300'000}}) {
+      for (int use = 0; use < 3; ++use) {
+        auto* p = static_cast<uint8_t*>(Heap().Allocate(size));
+        ASSERT_NE(p, nullptr);
+        ASSERT_TRUE(AllZero(p, size)) << size << " use " << use;
+        std::memset(p, 0xC3, size);
+        Heap().Deallocate(p);
+      }
+    }
+  }).join();
+}
+
 TEST(HydraAllocator, FiguresCountBlocksAndLogicalBytes) {
   const uint64_t blocks = HydraDebugging::BlocksInOperatorNewPools();
   const uint64_t logical = HydraDebugging::LogicalBytesInOperatorNewPools();

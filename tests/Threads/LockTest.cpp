@@ -143,6 +143,56 @@ TEST(TarnBinarySemaphore, HoldsOneUnit) {
   EXPECT_EQ(b.TimedWait(2000000), TarnBinarySemaphore::kTimedOut);
 }
 
+// Of several sleeping timed waiters one signal wakes exactly one; the others
+// time out and leave no trace: the next signal is kept for the next taker.
+TEST(TarnBinarySemaphore, OneSignalServesOneOfManySleepers) {
+  TarnBinarySemaphore b;
+  std::atomic<int> taken{0}, timedOut{0};
+  std::thread signaller([&] {
+    std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    b.Signal();
+  });
+  RunThreads(4, [&](int) {
+    const auto reason = b.TimedWait(300'000'000);
+    (reason == TarnBinarySemaphore::kSignalled ? taken : timedOut).fetch_add(1);
+  });
+  signaller.join();
+  EXPECT_EQ(taken.load(), 1);
+  EXPECT_EQ(timedOut.load(), 3);
+  EXPECT_EQ(b.TimedWait(0), TarnBinarySemaphore::kTimedOut);
+  b.Signal();
+  EXPECT_EQ(b.TimedWait(0), TarnBinarySemaphore::kSignalled);
+}
+
+// Two threads hand a turn back and forth through two semaphores, with both
+// kinds of wait; a lost wake-up hangs here, a doubled one breaks the order.
+TEST(TarnBinarySemaphore, PingPongLosesNoWakeUp) {
+  constexpr int kRounds = 20000;
+  TarnBinarySemaphore ping, pong;
+  int turn = 0;
+  std::thread other([&] {
+    for (int i = 0; i < kRounds; ++i) {
+      if (i % 2 == 0) {
+        ping.Wait();
+      } else {
+        while (ping.TimedWait(1'000'000'000) != TarnBinarySemaphore::kSignalled) {
+        }
+      }
+      EXPECT_EQ(turn, 2 * i + 1);
+      ++turn;
+      pong.Signal();
+    }
+  });
+  for (int i = 0; i < kRounds; ++i) {
+    EXPECT_EQ(turn, 2 * i);
+    ++turn;
+    ping.Signal();
+    pong.Wait();
+  }
+  other.join();
+  EXPECT_EQ(turn, 2 * kRounds);
+}
+
 TEST(TarnCoreRecursiveMutex, TagsReleaseWhatTheyTookAndOthersCannotUnlock) {
   TarnCoreRecursiveMutex m;
   TarnMutexLockTag held, refused;
