@@ -199,14 +199,11 @@ TEST(Facade, RecoversCrashedRecordings) {
         ASSERT_EQ(fs::file_size(path), before);
         ASSERT_EQ(SoundFileReader(Spec(path)).GetLengthInFrames(), headerFrames);
 
-        // Audio the writer got to disk before it died, header not updated.
-        // An AIFF file takes its length from the file size; a WAVE file
-        // whose header tells frames keeps them (every flush wrote its
-        // header), one whose header tells none takes the file size.
+        // Audio the writer got to disk before it died, after the header's
+        // last update: every whole frame of it is recovered.
         Append(path, Interleaved16(777, 2, headerFrames), t.bigEndian, partial);
         SoundFileWriter::RecoverCrashedRecording(Spec(path));
-        const std::int64_t expected =
-            t.bigEndian || headerFrames == 0 ? headerFrames + 777 : headerFrames;
+        const std::int64_t expected = headerFrames + 777;
         SoundFileReader file(Spec(path));
         ASSERT_EQ(file.GetLengthInFrames(), expected);
         std::vector<std::int16_t> l(1800), r(1800);

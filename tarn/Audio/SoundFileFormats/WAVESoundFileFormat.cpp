@@ -581,9 +581,19 @@ void WAVESoundFileFormat::RecoverCrashedRecording() {
   if (!r.CanParse()) return;
   const auto& chunks = r.GetChunks();
   if (chunks.empty() || chunks.back().tag != kDataTag) return;  // metadata after the audio
+  // The audio runs to the end of the file: every whole frame there reached
+  // the disk, whether the header was last written with no length, with the
+  // length of an earlier flush, or (a torn size field) with more than the
+  // file holds. Only the pad byte(s) after a declared length are no audio.
   const std::int64_t room = r.GetFileLength() - r.GetHeaderSize();
-  if (room <= 0 || (r.GetDataLength() != 0 && r.GetDataLength() <= room)) return;
-  const SampleCount frames = room / r.GetSampleFrameSize();
+  const std::int64_t declared = r.GetDataLength();
+  const std::int64_t frameSize = r.GetSampleFrameSize();
+  if (room <= 0 || frameSize <= 0) return;
+  if (declared != 0 && declared <= room &&
+      (room <= WAVEWriter::PadDataLength(declared, r.IsWave64()) ||
+       room / frameSize <= declared / frameSize))
+    return;
+  const SampleCount frames = room / frameSize;
   if (ShouldSwitchToExtendedFileFormat(frames) && r.CanSwitchToWave64())
     SwitchToExtendedFileFormat(frames);
   AdjustLengthInHeader(GetFileAttributes(), frames);
