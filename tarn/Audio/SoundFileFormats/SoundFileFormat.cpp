@@ -4,6 +4,11 @@
 // SoundFileTypeTable.cpp.
 #include "tarn/Audio/SoundFileFormats/SoundFileFormat.h"
 
+#include <utility>
+
+#include "tarn/Audio/AudioInFile.h"
+#include "tarn/Audio/AudioOutFile.h"
+
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatFailImpl.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileTypeTable.h"
@@ -18,21 +23,33 @@ SoundFileFormat::~SoundFileFormat() = default;
 
 std::vector<double> SoundFileFormat::GetCachedRates() { return {}; }
 
-std::unique_ptr<AsyncAudioReader> SoundFileFormat::MakeReader(const TimeRangeOf<SampleCount>&,
-                                                              double) {
-  sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr, "audio readers are not available",
-                        file_);
-}
-
-std::unique_ptr<AudioReader> SoundFileFormat::MakeFloatingPointReader(
-    const TimeRangeOf<SampleCount>&, double) {
-  sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr,
-                        "floating-point audio readers are not available", file_);
+std::unique_ptr<AsyncAudioReader> SoundFileFormat::MakeReader(
+    const TimeRangeOf<SampleCount>& range, double rate) {
+  if (FormatRequiresExternalConversion())
+    sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr,
+                          "this file is read through the outside converter only", file_);
+  if (rate != GetNaturalRate())
+    sffimpl::FailWithText("SoundFileFormat", kParamErr,
+                          "a reader delivers the file's own sample rate only", file_);
+  const DSPSoundBiteSpec bite{file_, GetFileAttributes(), GetChannelOrder(), range};
+  return std::make_unique<AudioInFile>(bite, FileLength{GetLengthInFrames()});
 }
 
 std::shared_ptr<InterAudioWriter> SoundFileFormat::MakeWriter() {
-  sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr, "audio writers are not available",
-                        file_);
+  if (FormatRequiresExternalConversion())
+    sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr,
+                          "this file is read through the outside converter only", file_);
+  std::shared_ptr<SoundFileFormat> self = weak_from_this().lock();
+  if (!self)
+    sffimpl::FailWithText("SoundFileFormat", kParamErr,
+                          "a writer needs a format object owned by a shared_ptr", file_);
+  // Appended audio must end the file: chunks after the audio go first.
+  const SoundFileAttributes attributes = GetFileAttributes();
+  AudioOutFile::CheckPlainSampleData(attributes, file_);
+  const std::int64_t audioEnd =
+      attributes.mOffsetToAudio + GetLengthInFrames().AsLongLong() * attributes.mBytesPerFrame;
+  if (File(file_).GetFileDataSize() > audioEnd + (audioEnd & 1)) RemoveTrailingMetaData();
+  return std::make_shared<AudioOutFile>(std::move(self));
 }
 
 void SoundFileFormat::Delete() {

@@ -87,8 +87,15 @@ class SoundFileFormat : public std::enable_shared_from_this<SoundFileFormat> {
   // 2: rates for which renderings of the file are cached; none here.
   [[nodiscard]] virtual std::vector<double> GetCachedRates();
   // 3-5: the audio layer's reader over a range of frames at a rate, its
-  // floating-point reader, and its writer. Here they throw
-  // kNotAvailableErr.
+  // floating-point reader, and its writer. For a file whose
+  // GetFileAttributes describe plain PCM or float samples, MakeReader gives
+  // an AudioInFile over `range` (cut at the file's length; frame 0 is
+  // range.start) and throws -50 unless `rate` is GetNaturalRate();
+  // MakeWriter gives an AudioOutFile appending after the present audio (chunks
+  // after the audio are removed first) and needs this object to be owned by
+  // a shared_ptr (-50 otherwise). Other sample layouts throw -50; files
+  // that need the outside converter, and MakeFloatingPointReader here,
+  // throw kNotAvailableErr.
   [[nodiscard]] virtual std::unique_ptr<AsyncAudioReader> MakeReader(
       const TimeRangeOf<SampleCount>& range, double rate);
   [[nodiscard]] virtual std::unique_ptr<AudioReader> MakeFloatingPointReader(

@@ -1,0 +1,139 @@
+#include "tarn/Audio/AudioInFile.h"
+
+#include <algorithm>
+#include <limits>
+
+#include "tarn/Audio/AudioOutFile.h"
+#include "tarn/Errors/Fail.h"
+
+namespace tarn {
+
+namespace {
+
+AudioFormat CheckedFormat(const DSPSoundBiteSpec& bite, std::optional<SampleFormat> override) {
+  AudioOutFile::CheckPlainSampleData(bite.mAttributes, bite.mFile);
+  const SoundFileAttributes& a = bite.mAttributes;
+  const SampleFormat format = override.value_or(a.mSampleFormat);
+  if (GetBytesPerSample(format) != a.mBytesPerSample || bite.mRange.start.AsLongLong() < 0 ||
+      bite.mRange.end < bite.mRange.start)
+    FailFSErr(kParamErr, bite.mFile);
+  return {format, a.mNumChannels, a.mSampleRate};
+}
+
+}  // namespace
+
+AudioInFile::AudioInFile(const DSPSoundBiteSpec& bite, const FileLength& length,
+                         PlatformFileOptions options)
+    : AudioInFile(bite, length, bite.mAttributes.mSampleFormat, options) {}
+
+AudioInFile::AudioInFile(const DSPSoundBiteSpec& bite, const FileLength& length,
+                         SampleFormat sampleFormat, PlatformFileOptions options)
+    : AudioFile(bite.mFile, bite.mAttributes.mOffsetToAudio,
+                LSBOrderToByteSwapOption(bite.mAttributes.mSamplesAreLSBFirst),
+                CheckedFormat(bite, sampleFormat), false, options),
+      channelOrder_(bite.mChannelOrder) {
+  const std::int64_t frameSize = GetFrameSize();
+  const std::int64_t maxFrames = (std::numeric_limits<std::int64_t>::max() / 2) / frameSize;
+  const std::int64_t start = bite.mRange.start.AsLongLong();
+  const std::int64_t end =
+      std::max(start, std::min(bite.mRange.end.AsLongLong(), length.mFrames.AsLongLong()));
+  if (end > maxFrames) FailFSErr(kParamErr, bite.mFile);
+  firstByte_ = GetHeaderSize() + start * frameSize;
+  dataEnd_ = GetHeaderSize() + end * frameSize;
+}
+
+AudioInFile::~AudioInFile() = default;
+
+SampleCount AudioInFile::GetLengthInFrames() const {
+  return (dataEnd_ - firstByte_) / GetFrameSize();
+}
+
+SampleCount AudioInFile::GetReadPosition() const { return readPosition_ / GetFrameSize(); }
+
+void AudioInFile::SetReadPosition(SampleCount frame) {
+  const std::int64_t frames =
+      std::clamp<std::int64_t>(frame.AsLongLong(), 0, GetLengthInFrames().AsLongLong());
+  readPosition_ = frames * GetFrameSize();
+}
+
+void AudioInFile::PreflightReadRequest(SampleCount start, SampleCount frames,
+                                       std::int64_t& bytePosition, std::int64_t& byteCount) const {
+  // The stretch holds a whole number of frames, so cutting in frames is
+  // cutting at the data end.
+  const std::int64_t frameSize = GetFrameSize();
+  const std::int64_t available = (dataEnd_ - firstByte_) / frameSize;
+  const std::int64_t first = std::clamp<std::int64_t>(start.AsLongLong(), 0, available);
+  const std::int64_t count = std::clamp<std::int64_t>(frames.AsLongLong(), 0, available - first);
+  bytePosition = first * frameSize;
+  byteCount = count * frameSize;
+}
+
+SampleCount AudioInFile::Read(void* buffer, SampleCount frames) {
+  PlatformAudioFile& file = OpenFile();
+  const std::int64_t frameSize = GetFrameSize();
+  const std::int64_t left = (dataEnd_ - firstByte_ - readPosition_) / frameSize;
+  const std::int64_t count = std::clamp<std::int64_t>(frames.AsLongLong(), 0, left);
+  if (count == 0) return 0;
+  const FileResult result = file.SyncRead(buffer, static_cast<std::uint64_t>(count * frameSize),
+                                          static_cast<std::uint64_t>(firstByte_ + readPosition_));
+  const std::int64_t whole = result.bytes / frameSize * frameSize;
+  if (ShouldSwapBuffer()) ByteSwapBuffer(buffer, whole);
+  if (result.status == kFileEOFErr) {
+    readPosition_ = dataEnd_ - firstByte_;
+  } else {
+    readPosition_ += result.bytes;
+    FailOSErr(result.status);
+  }
+  return result.bytes / frameSize;
+}
+
+SampleCount AudioInFile::OutOfOrderRead(void* buffer, SampleCount start, SampleCount frames) {
+  PlatformAudioFile& file = OpenFile();
+  std::int64_t position = 0, count = 0;
+  PreflightReadRequest(start, frames, position, count);
+  if (count == 0) return 0;
+  const FileResult result = file.SyncRead(buffer, static_cast<std::uint64_t>(count),
+                                          static_cast<std::uint64_t>(firstByte_ + position));
+  if (ShouldSwapBuffer()) ByteSwapBuffer(buffer, result.bytes / GetFrameSize() * GetFrameSize());
+  FailOSErr(result.status);
+  return result.bytes / GetFrameSize();
+}
+
+void AudioInFile::OutOfOrderReadAsync(void* buffer, SampleCount start, SampleCount frames,
+                                      Completion completion) {
+  PlatformAudioFile& file = OpenFile();
+  std::int64_t position = 0, count = 0;
+  PreflightReadRequest(start, frames, position, count);
+  file.AsyncRead(buffer, static_cast<std::uint64_t>(firstByte_ + position),
+                 static_cast<std::uint64_t>(count),
+                 [this, buffer, completion = std::move(completion)](std::int32_t status,
+                                                                    std::int32_t bytes) {
+                   CompleteRead(buffer, status, bytes, completion);
+                 });
+}
+
+void AudioInFile::CompleteRead(void* buffer, std::int32_t status, std::int32_t bytes,
+                               const Completion& completion) const {
+  if (monitor_) monitor_->BytesCompleted(bytes);
+  const std::int64_t frames = bytes / GetFrameSize();
+  if (ShouldSwapBuffer()) ByteSwapBuffer(buffer, frames * GetFrameSize());
+  completion(status, frames);
+}
+
+void AudioInFile::SetByteSwappingBasedOnDesriedOutputByteOrder(bool fileIsLSBFirst,
+                                                               bool wantedLSBFirst) noexcept {
+  SetByteSwapOption(fileIsLSBFirst == wantedLSBFirst ? kNoByteSwap : kByteSwap);
+}
+
+SampleCount AudioInFile::CheckEndPosition() {
+  const FileResult size = OpenFile().GetSize();
+  FailOSErr(size.status);
+  if (size.bytes < dataEnd_) {
+    const std::int64_t frames = std::max<std::int64_t>(size.bytes - firstByte_, 0) / GetFrameSize();
+    dataEnd_ = firstByte_ + frames * GetFrameSize();
+    readPosition_ = std::min(readPosition_, dataEnd_ - firstByte_);
+  }
+  return GetLengthInFrames();
+}
+
+}  // namespace tarn
