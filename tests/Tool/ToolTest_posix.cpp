@@ -322,6 +322,56 @@ TEST_F(ToolTest, RecoverRepairsAnUnclosedRecording) {
   EXPECT_NE(Tool("recover r.wav").out.find("header whole"), std::string::npos);
 }
 
+// Tones and conversions as sox and libsndfile read them.
+TEST_F(ToolTest, TonesAndConversionsReadElsewhere) {
+  Need("sox", "sox");
+  Need("sndfile-info", "sndfile-programs");
+  const std::string tone = " --rate 44100 --seconds 0.25";
+  struct Case {
+    std::string args;
+    const char* file;
+    const char* format;
+    const char* sampleFormat;
+    const char* soxBits;
+    const char* channels;
+  } cases[] = {
+      {"tone t1.wav --format u8 --channels 1" + tone, "t1.wav", "WAVE", "u8", "8", "1"},
+      {"tone t2.w64 --type w64 --format s24" + tone, "t2.w64", "Wave64", "s24", "24", "2"},
+      {"tone t3.aif --format s8 --shape square" + tone, "t3.aif", "AIFF", "s8", "8", "2"},
+      {"tone t4.aifc --format f64 --shape saw --channels 3" + tone, "t4.aifc", "AIFC", "f64", "64",
+       "3"},
+      {"tone t5.wav --format s24in32 --channels 4 --shape triangle" + tone, "t5.wav", "WAVE",
+       "s24in32", "32", "4"},
+      {"convert t2.w64 c1.aiff --format s16 --dither tpdf", "c1.aiff", "AIFF", "s16", "16", "2"},
+      {"convert t1.wav c2.w64 --format f32", "c2.w64", "Wave64", "f32", "32", "1"},
+      {"convert t4.aifc c3.wav --unbuffered", "c3.wav", "WAVE", "f64", "64", "3"},
+      {"convert t3.aif c4.aiff --type aifc --format s24in32", "c4.aiff", "AIFC", "s24in32", "32",
+       "2"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.args);
+    const Result r = Tool(c.args);
+    ASSERT_EQ(r.status, 0) << r.err;
+    EXPECT_TRUE(r.err.empty()) << "no progress off a terminal: " << r.err;
+    const std::string json = Tool(std::string("info --json ") + c.file).out;
+    EXPECT_EQ(JsonValue(json, "format"), c.format);
+    EXPECT_EQ(JsonValue(json, "sample_format"), c.sampleFormat);
+    EXPECT_EQ(JsonValue(json, "frames"), "11025");
+    EXPECT_EQ(JsonValue(json, "channels"), c.channels);
+    const std::string soxFile = c.file;
+    EXPECT_EQ(Output("soxi -s " + soxFile), "11025");
+    EXPECT_EQ(Output("soxi -b " + soxFile), c.soxBits);
+    EXPECT_EQ(Output("soxi -c " + soxFile), c.channels);
+    EXPECT_EQ(Output("soxi -r " + soxFile), "44100");
+    // Every tone peaks at half of full scale (-6 dB).
+    EXPECT_NE(Output(std::string("sndfile-info ") + c.file + " | grep 'Signal Max'").find("(-6.0"),
+              std::string::npos);
+  }
+  // An option convert does not take: a usage error, nothing written.
+  EXPECT_EQ(Tool("convert t1.wav x.wav --channels 2").status, 2);
+  EXPECT_FALSE(fs::exists(P("x.wav")));
+}
+
 TEST_F(ToolTest, DemoRunsToTheEnd) {
   const Result r = Tool("demo demo-files");
   ASSERT_EQ(r.status, 0) << r.out << r.err;
