@@ -138,6 +138,7 @@ TEST_F(ToolTest, ExitStatusHelpAndMessages) {
       {"tone out.wav --seconds x", 2, "", "must be a number"},
       {"convert t.wav", 2, "", "missing argument"},
       {"convert t.wav o.wav --dither loud", 2, "", "--dither"},
+      {"convert t.wav ./t.wav --format s24", 2, "", "the same file"},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.args);

@@ -1,5 +1,6 @@
 // convert and tone: audio through the reader and writer chain.
 #include <cstdio>
+#include <filesystem>
 
 #include "AudioJobs.h"
 #include "Commands.h"
@@ -29,6 +30,9 @@ int RunConvert(const Words& words) {
   const CommandLine cl(words, {"unbuffered"}, {"type", "format", "dither"}, 2, 2);
   const std::string& in = cl.Positional()[0];
   const std::string& out = cl.Positional()[1];
+  std::error_code error;
+  if (std::filesystem::equivalent(std::filesystem::u8path(in), std::filesystem::u8path(out), error))
+    throw UsageError("IN and OUT are the same file");
   AudioTarget target;
   target.dither = ParseDither(cl);
   target.unbuffered = cl.Has("unbuffered");

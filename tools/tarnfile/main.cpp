@@ -53,7 +53,9 @@ const Command kCommands[] = {
      "[--seconds S] [--shape sine|square|saw|triangle] [--freq F] [--amplitude A]",
      "write a test tone",
      "  defaults: --format s16 --rate 48000 --channels 2 --seconds 2 --shape sine\n"
-     "            --freq 440 --amplitude 0.5 (of full scale)\n",
+     "            --freq 440 --amplitude 0.5 (of full scale)\n"
+     "  --dither none|tpdf  dither when writing 8 or 16 bits (default none)\n"
+     "  --unbuffered        write bypassing the system's file cache\n",
      RunTone},
     {"demo", "demo [DIR]",
      "make, write, read, convert and edit files in every container and sample format",
