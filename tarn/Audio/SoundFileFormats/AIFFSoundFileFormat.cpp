@@ -8,6 +8,7 @@
 
 #include "tarn/Audio/SoundFileFormats/AIFFWriter.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
+#include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
 #include "tarn/Audio/SoundFileFormats/WAVEWriter.h"
 #include "tarn/Errors/Fail.h"
 #include "tarn/Streams/CFileStream.h"
@@ -474,6 +475,56 @@ bool AIFFSoundFileFormat::AudioDataIsZeroLength() {
   std::lock_guard guard(lock_);
   RIFFFileEditor editor(GetFile(), kRIFFBigEndian, GetAIFFRIFFFormatHandler());
   return editor.AudioDataIsZeroLength(AIFFReader::kSSND, 8);
+}
+
+void AIFFSoundFileFormat::RecoverCrashedRecording() {
+  std::int64_t start = 0;
+  std::int64_t frameSize = 0;
+  std::int64_t declaredEnd = 0;
+  std::int64_t headerFrames = 0;
+  {
+    std::lock_guard guard(lock_);
+    Forget();
+    AIFFReader& reader = Reader();
+    if (!reader.CanParse()) return;
+    start = reader.GetHeaderSize();
+    frameSize = reader.GetSampleFrameSize();
+    headerFrames = reader.GetNumberOfFrames();
+    const std::int64_t ssnd = reader.GetOffsetToSoundChunk();
+    CFileStream stream(GetFile(), kStreamBufferSize);
+    stream.Open(kTCLReadMode);
+    const std::int64_t fileLength = stream.Size();
+    if (frameSize < 1 || start > fileLength) return;
+    stream.MoveTo(ssnd + 4);
+    declaredEnd =
+        WAVEWriter::PadDataLength(ssnd + 8 + static_cast<std::uint32_t>(stream.GetLong()), false);
+    // Trailing metadata: printable tags whose sizes lead exactly to the end.
+    bool trailingChunks = declaredEnd <= fileLength;
+    for (std::int64_t at = declaredEnd; trailingChunks && at < fileLength;) {
+      if (at + 8 > fileLength) {
+        trailingChunks = false;
+        break;
+      }
+      stream.MoveTo(at);
+      std::uint8_t tag[4];
+      stream.GetRawDataFromStream(tag, 4);
+      for (std::uint8_t ch : tag) trailingChunks = trailingChunks && ch >= 0x20 && ch <= 0x7E;
+      at = WAVEWriter::PadDataLength(at + 8 + static_cast<std::uint32_t>(stream.GetLong()), false);
+      trailingChunks = trailingChunks && at <= fileLength;
+    }
+    const std::int64_t frames = (fileLength - start) / frameSize;
+    if (trailingChunks && headerFrames <= frames) return;
+    stream.Close();
+    if (frames == headerFrames && start + frames * frameSize == fileLength) return;
+    headerFrames = frames;
+    CFileStream cut(GetFile(), kStreamBufferSize);
+    cut.Open(kTCLReadWriteMode);
+    cut.SetPhysicalSize(start + frames * frameSize);
+    cut.Close();
+    Forget();
+  }
+  AdjustLengthInHeader(GetFileAttributes(), headerFrames);
+  SoundFileFormatCache::Instance().FormatChanged(*this);
 }
 
 void AIFFSoundFileFormat::GetRawHeader(std::vector<std::uint8_t>& header) {

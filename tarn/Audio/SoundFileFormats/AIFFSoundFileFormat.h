@@ -111,6 +111,15 @@ class AIFFSoundFileFormat final : public SoundFileFormat {
   void AddFileLoops(ReadWriteMetaDataAccess& access,
                     const std::vector<SoundFileFormatLoop>& loops) override;
   bool AudioDataIsZeroLength() override;
+  // Repairs the file of a writer that died: when the bytes after the
+  // "SSND" chunk's declared end are not a chain of well-formed chunks that
+  // ends with the file (so they are audio written after the last header
+  // update), or the header claims more frames than the file holds, the
+  // frame count and chunk sizes are set from the file's size (whole frames;
+  // a partial last frame is cut off). A file whose header is right is left
+  // alone; one that is not AIFF is left alone; a length AIFF cannot hold
+  // fails with -50.
+  void RecoverCrashedRecording() override;
   bool SupportsRawHeader() override { return true; }
   void GetRawHeader(std::vector<std::uint8_t>& header) override;
   bool HasMetaData(ReadOnlyMetaDataAccess& access, std::uint32_t tag) override;
