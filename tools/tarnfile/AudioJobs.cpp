@@ -4,13 +4,10 @@
 #include <filesystem>
 
 #include "Progress.h"
-#include "tarn/Audio/AsyncAudioReader.h"
-#include "tarn/Audio/AudioOutFile.h"
 #include "tarn/Audio/BufConverter.h"
-#include "tarn/Audio/ConvertingWriter.h"
-#include "tarn/Audio/PlatformFileDriver.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormat.h"
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
+#include "tarn/Audio/SoundFileReader.h"
+#include "tarn/Audio/SoundFileWriter.h"
 
 namespace tarnfile {
 
@@ -23,49 +20,36 @@ constexpr std::int64_t kBlockFrames = 16384;
 
 bool IsWAVEFamily(Container c) { return c == Container::kRIFF || c == Container::kWave64; }
 
-// A new, empty file at `path` for the target's attributes; the old file of
-// that name goes first.
-std::shared_ptr<tarn::SoundFileFormat> CreateSoundFile(const std::string& path,
-                                                       const AudioTarget& target) {
+// A new file at `path` (replacing one of that name) for the target,
+// taking samples of `client`.
+std::unique_ptr<tarn::SoundFileWriter> CreateWriter(const std::string& path,
+                                                    const AudioTarget& target,
+                                                    SampleFormat client) {
   CheckStorable(target.container, target.format, target.channels);
-  const tarn::FileSpecification spec = SpecForPath(path);
-  auto& cache = tarn::SoundFileFormatCache::Instance();
-  if (cache.FindFormat(spec)) tarn::FailFSErr(tarn::kAccessDeniedErr, spec);  // in use here
-  std::error_code ignored;
-  std::filesystem::remove(std::filesystem::u8path(spec.GetFullPath().utf8_str()), ignored);
-  tarn::SoundFileAttributes a;
+  tarn::SoundFileWriter::Settings settings;
   switch (target.container) {
     case Container::kRIFF:
-      a.mFileType = MakeRIFFType("WAVE");
+      settings.fileType = MakeRIFFType("WAVE");
       break;
     case Container::kWave64:
-      a.mFileType = MakeRIFFType(".W64");
+      settings.fileType = MakeRIFFType(".W64");
       break;
     case Container::kAIFF:
-      a.mFileType = MakeRIFFType("AIFF");
+      settings.fileType = MakeRIFFType("AIFF");
       break;
     case Container::kAIFC:
     case Container::kUnknown:
-      a.mFileType = MakeRIFFType("AIFC");
+      settings.fileType = MakeRIFFType("AIFC");
       break;
   }
-  a.mNumChannels = static_cast<std::int16_t>(target.channels);
-  a.mSampleRate = target.rate;
-  a.mSampleFormat = target.format;
-  a.mBytesPerSample = static_cast<std::int16_t>(tarn::GetBytesPerSample(target.format));
-  a.mBytesPerFrame = a.mBytesPerSample * target.channels;
-  a.mSamplesAreLSBFirst = IsWAVEFamily(target.container);
-  auto format = cache.GetFormat(
-      spec, IsWAVEFamily(target.container) ? MakeRIFFType("WAVE") : MakeRIFFType("AIFF"));
-  (void)format->CreateFileOnDisk(a, 0, false, a);
-  return format;
-}
-
-std::shared_ptr<tarn::AudioOutFile> OpenForAppending(std::shared_ptr<tarn::SoundFileFormat> format,
-                                                     bool unbuffered) {
-  tarn::PlatformFileOptions options;
-  options.mCachingMode = unbuffered ? tarn::kUnbufferedCaching : tarn::kCachedCaching;
-  return std::make_shared<tarn::AudioOutFile>(std::move(format), options);
+  settings.numChannels = static_cast<std::int16_t>(target.channels);
+  settings.sampleRate = target.rate;
+  settings.fileFormat = target.format;
+  settings.clientFormat = client;
+  settings.dither = target.dither;
+  settings.recording = false;
+  settings.unbuffered = target.unbuffered;
+  return std::make_unique<tarn::SoundFileWriter>(SpecForPath(path), settings);
 }
 
 // Turns `count` samples of `format` into floats. The library's converter
@@ -90,6 +74,24 @@ class FloatStage {
  private:
   SampleFormat format_;
   std::unique_ptr<tarn::BufConverter> converter_;
+};
+
+// One block of samples per channel and the pointers the facade takes.
+class ChannelBlocks {
+ public:
+  ChannelBlocks(int channels, std::size_t bytesPerChannel)
+      : storage_(static_cast<std::size_t>(channels)) {
+    for (auto& s : storage_) {
+      s.resize((bytesPerChannel + sizeof(double) - 1) / sizeof(double));
+      pointers_.push_back(s.data());
+    }
+  }
+  [[nodiscard]] void* const* Pointers() const noexcept { return pointers_.data(); }
+  [[nodiscard]] void* operator[](std::size_t channel) const noexcept { return pointers_[channel]; }
+
+ private:
+  std::vector<std::vector<double>> storage_;  // doubles: aligned for any sample type
+  std::vector<void*> pointers_;
 };
 
 }  // namespace
@@ -139,54 +141,52 @@ void CheckStorable(Container container, SampleFormat format, int channels) {
 }
 
 std::int64_t ConvertFile(const std::string& in, const std::string& out, AudioTarget target) {
-  std::int64_t frames = 0;
-  SampleFormat inFormat;
-  std::unique_ptr<tarn::AsyncAudioReader> reader;
+  std::unique_ptr<tarn::SoundFileReader> reader;
   {
     FileScope scope(in);
-    const SoundFile source = OpenSoundFile(in);
-    frames = source.frames;
-    inFormat = source.attributes.mSampleFormat;
-    target.channels = source.attributes.mNumChannels;
-    target.rate = source.attributes.mSampleRate;
-    reader = source.format->MakeReader({0, frames}, source.attributes.mSampleRate);
+    reader = std::make_unique<tarn::SoundFileReader>(OpenSoundFile(in).format);
   }
-  FileScope scope(out);
-  // The converting writer takes the source's samples as they are, unless one
-  // side is the 8-byte float: then they pass through floats.
+  const std::int64_t frames = reader->GetLengthInFrames().AsLongLong();
+  const SampleFormat inFormat = reader->GetAttributes().mSampleFormat;
+  target.channels = reader->GetNumChannels();
+  target.rate = reader->GetSampleRate();
+  // The writer takes the source's samples as they are, unless one side is
+  // the 8-byte float: then they pass through floats here.
   const bool direct = inFormat == target.format ||
                       (inFormat != tarn::kSampWide64B && target.format != tarn::kSampWide64B);
   const SampleFormat client = direct                                ? inFormat
                               : target.format == tarn::kSampWide64B ? tarn::kSampWide64B
                                                                     : tarn::kSampFloat32;
-  tarn::ConvertingWriter writer(OpenForAppending(CreateSoundFile(out, target), target.unbuffered),
-                                client, target.dither);
+  FileScope scope(out);
+  const auto writer = CreateWriter(out, target, client);
+  const auto block = static_cast<std::size_t>(kBlockFrames);
+  const ChannelBlocks source(target.channels, block * 8);
+  const ChannelBlocks floats(direct ? 0 : target.channels, block * sizeof(float));
+  const ChannelBlocks wide(client == tarn::kSampWide64B && !direct ? target.channels : 0,
+                           block * sizeof(double));
   const FloatStage toFloat(inFormat);
-  const auto samples = static_cast<std::size_t>(kBlockFrames * target.channels);
-  std::vector<std::uint8_t> block(static_cast<std::size_t>(kBlockFrames) *
-                                  static_cast<std::size_t>(reader->GetBytesPerFrame()));
-  std::vector<float> floats(direct ? 0 : samples);
-  std::vector<double> doubles(client == tarn::kSampWide64B && !direct ? samples : 0);
   Progress progress("converting", frames);
   std::int64_t done = 0;
   while (done < frames) {
-    const std::int64_t got = reader->Read(block.data(), kBlockFrames).AsLongLong();
+    const std::int64_t got =
+        reader->Read(done, std::min(kBlockFrames, frames - done), source.Pointers(), inFormat)
+            .AsLongLong();
     if (got <= 0) break;
     if (direct) {
-      writer.Write(block.data(), got);
+      writer->Write(source.Pointers(), got);
     } else {
-      toFloat.Convert(block.data(), floats.data(), got * target.channels);
-      if (doubles.empty()) {
-        writer.Write(floats.data(), got);
-      } else {
-        std::copy_n(floats.begin(), got * target.channels, doubles.begin());
-        writer.Write(doubles.data(), got);
+      for (int ch = 0; ch < target.channels; ++ch) {
+        auto* f = static_cast<float*>(floats[static_cast<std::size_t>(ch)]);
+        toFloat.Convert(source[static_cast<std::size_t>(ch)], f, got);
+        if (client == tarn::kSampWide64B)
+          std::copy_n(f, got, static_cast<double*>(wide[static_cast<std::size_t>(ch)]));
       }
+      writer->Write(client == tarn::kSampWide64B ? wide.Pointers() : floats.Pointers(), got);
     }
     done += got;
     progress.Update(done);
   }
-  writer.Close();
+  writer->Close();
   return done;
 }
 
@@ -222,10 +222,9 @@ void WriteTone(const std::string& out, const AudioTarget& target, const Tone& to
   FileScope scope(out);
   const tarn::FunctionGenerator generator = MakeToneGenerator(tone, target.rate);
   // 8-byte files get the generator's doubles; every other format is made
-  // from floats by the converting writer.
+  // from floats by the writer's converter.
   const bool wide = target.format == tarn::kSampWide64B;
-  tarn::ConvertingWriter writer(OpenForAppending(CreateSoundFile(out, target), target.unbuffered),
-                                wide ? tarn::kSampWide64B : tarn::kSampFloat32, target.dither);
+  const auto writer = CreateWriter(out, target, wide ? tarn::kSampWide64B : tarn::kSampFloat32);
   const auto channels = static_cast<std::size_t>(target.channels);
   std::vector<double> doubles(static_cast<std::size_t>(kBlockFrames) * channels);
   std::vector<float> floats(wide ? 0 : doubles.size());
@@ -236,33 +235,39 @@ void WriteTone(const std::string& out, const AudioTarget& target, const Tone& to
       std::fill_n(doubles.begin() + i * target.channels, channels,
                   generator.GetValue(static_cast<double>(done + i)));
     if (wide) {
-      writer.Write(doubles.data(), count);
+      writer->WriteInterleaved(doubles.data(), count);
     } else {
       std::copy_n(doubles.begin(), count * target.channels, floats.begin());
-      writer.Write(floats.data(), count);
+      writer->WriteInterleaved(floats.data(), count);
     }
     done += count;
     progress.Update(done);
   }
-  writer.Close();
+  writer->Close();
 }
 
-std::vector<float> ReadFramesAsFloat(const SoundFile& file) {
-  const auto reader = file.format->MakeReader({0, file.frames}, file.attributes.mSampleRate);
-  const FloatStage toFloat(reader->GetFormat().mSampleFormat);
-  const int channels = file.attributes.mNumChannels;
-  std::vector<float> frames(static_cast<std::size_t>(file.frames * channels));
-  std::vector<std::uint8_t> block(static_cast<std::size_t>(kBlockFrames) *
-                                  static_cast<std::size_t>(reader->GetBytesPerFrame()));
+std::vector<std::vector<float>> ReadFramesAsFloat(const SoundFile& file, std::int64_t frames) {
+  tarn::SoundFileReader reader(file.format);
+  const std::int64_t length = reader.GetLengthInFrames().AsLongLong();
+  frames = frames < 0 ? length : std::min(frames, length);
+  const SampleFormat format = reader.GetAttributes().mSampleFormat;
+  const auto channels = static_cast<std::size_t>(reader.GetNumChannels());
+  const FloatStage toFloat(format);
+  const ChannelBlocks block(reader.GetNumChannels(), static_cast<std::size_t>(kBlockFrames) * 8);
+  std::vector<std::vector<float>> out(channels,
+                                      std::vector<float>(static_cast<std::size_t>(frames)));
   std::int64_t done = 0;
-  while (done < file.frames) {
-    const std::int64_t got = reader->Read(block.data(), kBlockFrames).AsLongLong();
+  while (done < frames) {
+    const std::int64_t got =
+        reader.Read(done, std::min(kBlockFrames, frames - done), block.Pointers(), format)
+            .AsLongLong();
     if (got <= 0) break;
-    toFloat.Convert(block.data(), frames.data() + done * channels, got * channels);
+    for (std::size_t ch = 0; ch < channels; ++ch)
+      toFloat.Convert(block[ch], out[ch].data() + done, got);
     done += got;
   }
-  frames.resize(static_cast<std::size_t>(done * channels));
-  return frames;
+  for (auto& channel : out) channel.resize(static_cast<std::size_t>(done));
+  return out;
 }
 
 }  // namespace tarnfile

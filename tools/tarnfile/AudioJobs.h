@@ -3,9 +3,10 @@
 // four containers, conversion of one file's audio into another, tones from
 // the function generators, and reading a file's frames back as floats.
 //
-// Every job is synchronous and throws TarnErrors (file and format errors)
-// or UsageError (a container that cannot hold the sample format asked for).
-// Long jobs show a Progress bar on a terminal.
+// Files are read through SoundFileReader and written through
+// SoundFileWriter. Every job is synchronous and throws TarnErrors (file and
+// format errors) or UsageError (a container that cannot hold the sample
+// format asked for). Long jobs show a Progress bar on a terminal.
 
 #include <cstdint>
 #include <memory>
@@ -64,7 +65,9 @@ struct Tone {
 void WriteTone(const std::string& out, const AudioTarget& target, const Tone& tone,
                std::int64_t frames);
 
-// Every frame of a file as interleaved floats (full scale +-1).
-[[nodiscard]] std::vector<float> ReadFramesAsFloat(const SoundFile& file);
+// The first `frames` frames of a file (all when negative) as floats (full
+// scale +-1), one vector per channel.
+[[nodiscard]] std::vector<std::vector<float>> ReadFramesAsFloat(const SoundFile& file,
+                                                                std::int64_t frames = -1);
 
 }  // namespace tarnfile

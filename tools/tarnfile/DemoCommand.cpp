@@ -12,12 +12,10 @@
 #include "AudioJobs.h"
 #include "Commands.h"
 #include "ToolSupport.h"
-#include "tarn/Audio/AudioOutFile.h"
-#include "tarn/Audio/ConvertingWriter.h"
 #include "tarn/Audio/SoundFileFormats/BWFBroadcastWaveExtension.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFileEditor.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormat.h"
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
+#include "tarn/Audio/SoundFileWriter.h"
 #include "tarn/Basics/TarnCoreVersion.h"
 #include "tarn/Errors/Fail.h"
 #include "tarn/Streams/CFileStream.h"
@@ -127,7 +125,7 @@ class Demo {
       if (file.container != f.target.container || a.mNumChannels != f.target.channels ||
           a.mSampleRate != kRate || a.mSampleFormat != f.target.format || file.frames != kFrames)
         throw UsageError(f.path + ": header facts differ from what was written");
-      const std::vector<float> frames = ReadFramesAsFloat(file);
+      const auto frames = ReadFramesAsFloat(file);
       const int bits = 8 * tarn::GetBytesPerSample(f.target.format);
       const bool isFloat =
           f.target.format == tarn::kSampFloat32 || f.target.format == tarn::kSampWide64B;
@@ -137,9 +135,8 @@ class Demo {
       double error = 0;
       for (std::int64_t i = 0; i < kFrames; ++i) {
         const double want = generator.GetValue(static_cast<double>(i));
-        for (int ch = 0; ch < a.mNumChannels; ++ch)
-          error = std::max(
-              error, std::fabs(frames[static_cast<std::size_t>(i * a.mNumChannels + ch)] - want));
+        for (const auto& channel : frames)
+          error = std::max(error, std::fabs(channel[static_cast<std::size_t>(i)] - want));
       }
       std::printf("   %-22s %6lld frames, largest error %.3g (%.2f steps)\n",
                   fs::path(f.path).filename().string().c_str(), static_cast<long long>(file.frames),
@@ -165,13 +162,17 @@ class Demo {
     const auto a = ReadFramesAsFloat(OpenSoundFile(Path("convert-s16.wav")));
     const auto b = ReadFramesAsFloat(OpenSoundFile(Path("convert-s16-tpdf.wav")));
     std::size_t differ = 0;
+    std::size_t samples = 0;
     double most = 0;
-    for (std::size_t i = 0; i < a.size() && i < b.size(); ++i) {
-      differ += a[i] != b[i];
-      most = std::max(most, std::fabs(a[i] - b[i]) * 32768.0);
+    for (std::size_t ch = 0; ch < a.size() && ch < b.size(); ++ch) {
+      for (std::size_t i = 0; i < a[ch].size() && i < b[ch].size(); ++i) {
+        differ += a[ch][i] != b[ch][i];
+        most = std::max(most, std::fabs(a[ch][i] - b[ch][i]) * 32768.0);
+      }
+      samples += a[ch].size();
     }
     std::printf("   s24 -> s16: dither changed %zu of %zu samples, by at most %.0f steps\n", differ,
-                a.size(), most);
+                samples, most);
     if (a.size() != b.size() || differ == 0 || most > 2)
       throw UsageError("dithered and plain conversions do not differ as they should");
 
@@ -180,7 +181,7 @@ class Demo {
     const auto original = ReadFramesAsFloat(OpenSoundFile(Path("tone-s24.aiff")));
     const auto converted = ReadFramesAsFloat(OpenSoundFile(Path("convert-f32.w64")));
     if (original != converted) throw UsageError("24-bit to float conversion is not exact");
-    std::printf("   s24 AIFF -> f32 Wave64 (unbuffered): %zu samples, all equal\n",
+    std::printf("   s24 AIFF -> f32 Wave64 (unbuffered): %zu channels, all samples equal\n",
                 converted.size());
     return "s16 with and without dither (" + std::to_string(differ) +
            " samples differ), s24 AIFF -> f32 Wave64 exact";
@@ -254,42 +255,35 @@ class Demo {
     const std::string path = Path("recording.wav");
     FileScope scope(path);
     const tarn::FileSpecification spec = SpecForPath(path);
-    std::error_code ignored;
-    fs::remove(fs::u8path(path), ignored);
-    auto format = tarn::SoundFileFormatCache::Instance().GetFormat(spec, MakeRIFFType("WAVE"));
+    tarn::SoundFileWriter::Settings settings;  // a 16-bit stereo WAVE recording
+    settings.fileFormat = tarn::kSamp16;
+    settings.sampleRate = kRate;
     tarn::SoundFileAttributes a;
-    a.mFileType = MakeRIFFType("WAVE");
-    a.mNumChannels = 2;
-    a.mSampleRate = kRate;
-    a.mSampleFormat = tarn::kSamp16;
-    a.mBytesPerSample = 2;
-    a.mBytesPerFrame = 4;
-    a = format->CreateFileOnDisk(a, 0, true, a);
     {
+      tarn::SoundFileWriter writer(spec, settings);
       const tarn::FunctionGenerator generator = MakeToneGenerator(kTone, kRate);
       std::vector<float> frames(static_cast<std::size_t>(kFrames) * 2);
       for (std::size_t i = 0; i < frames.size(); ++i)
         frames[i] = static_cast<float>(generator.GetValue(static_cast<double>(i / 2)));
-      tarn::ConvertingWriter writer(std::make_shared<tarn::AudioOutFile>(format),
-                                    tarn::kSampFloat32);
-      writer.Write(frames.data(), kFrames);
+      writer.WriteInterleaved(frames.data(), kFrames);
       writer.Close();
+      a = writer.GetAttributes();
     }
     std::printf("   a recording, one second long:\n");
     RunChunks({path});
     const SoundFile small = OpenSoundFile(path);
-    const std::vector<float> firstSecond = ReadFramesAsFloat(small);
+    const auto firstSecond = ReadFramesAsFloat(small);
     // Recording goes on: the file grows past what 32-bit sizes hold. The
     // new space is a hole in the file (sparse where the file system can).
     const std::int64_t grownFrames = (std::int64_t{1} << 32) / a.mBytesPerFrame + kFrames;
     fs::resize_file(fs::u8path(path),
                     static_cast<std::uintmax_t>(a.mOffsetToAudio + grownFrames * a.mBytesPerFrame));
     {
-      auto access = format->GetReadWriteMetaDataAccess();
-      format->UpdateLengthAfterAppendingAudio(*access, format->GetFileAttributes());
+      SoundFile grown = OpenSoundFile(path);
+      auto access = grown.format->GetReadWriteMetaDataAccess();
+      grown.format->UpdateLengthAfterAppendingAudio(*access, grown.attributes);
       access->Flush();
     }
-    format.reset();
     std::printf("   after growing to %.2f GiB of audio:\n",
                 static_cast<double>(grownFrames * a.mBytesPerFrame) / (1 << 30));
     RunChunks({path});
@@ -300,8 +294,8 @@ class Demo {
     if (big.container != Container::kWave64 || big.frames != grownFrames ||
         big.attributes.mOffsetToAudio != small.attributes.mOffsetToAudio)
       throw UsageError("the recording was not switched to Wave64 in place");
-    big.frames = kFrames;  // the first second, read through the new header
-    if (ReadFramesAsFloat(big) != firstSecond) throw UsageError("the recorded audio changed");
+    if (ReadFramesAsFloat(big, kFrames) != firstSecond)
+      throw UsageError("the recorded audio changed");
     big.format.reset();
     fs::remove(fs::u8path(path));
     return "RIFF -> Wave64 in place at " + std::to_string(grownFrames) +
