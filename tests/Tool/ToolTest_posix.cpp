@@ -308,19 +308,44 @@ TEST_F(ToolTest, ChunkListingMatchesTheFile) {
       "\"length\":16},{\"tag\":\"data\",\"offset\":36,\"length\":160}]}\n");
 }
 
-TEST_F(ToolTest, RecoverRepairsAnUnclosedRecording) {
+// The offset of a chunk's header in `chunks --json` output.
+long ChunkOffset(const std::string& json, const std::string& tag) {
+  const std::string key = "{\"tag\":\"" + tag + "\",\"offset\":";
+  const std::size_t at = json.find(key);
+  return at == std::string::npos ? -1 : std::stol(json.substr(at + key.size()));
+}
+
+TEST_F(ToolTest, RecoverRepairsUnclosedRecordings) {
   Need("sox", "sox");
-  Make("sox -n -r 8000 -c 2 -b 16 r.wav synth 0.5 sine 440");
-  const std::string frames = Output("soxi -s r.wav");
-  // A recording that was never closed: the "data" size is still 0.
-  Make("printf '\\000\\000\\000\\000' | dd of=r.wav bs=1 seek=40 conv=notrunc status=none");
-  EXPECT_EQ(JsonValue(Tool("info --json r.wav").out, "frames"), "0");
-  const Result r = Tool("recover r.wav");
-  ASSERT_EQ(r.status, 0) << r.err;
-  EXPECT_NE(r.out.find("repaired"), std::string::npos) << r.out;
-  EXPECT_EQ(JsonValue(Tool("info --json r.wav").out, "frames"), frames);
-  EXPECT_EQ(Output("soxi -s r.wav"), frames);
-  EXPECT_NE(Tool("recover r.wav").out.find("header whole"), std::string::npos);
+  Make("sox -n -r 8000 -c 2 -b 16 r.wav synth 0.5 sine 440 && cp r.wav whole.wav");
+  Make("sox -n -r 8000 -c 2 -b 16 r.aiff synth 0.5 sine 440 && cp r.aiff whole.aiff");
+  const long data = ChunkOffset(Tool("chunks --json r.wav").out, "data");
+  const long ssnd = ChunkOffset(Tool("chunks --json r.aiff").out, "SSND");
+  const long comm = ChunkOffset(Tool("chunks --json r.aiff").out, "COMM");
+  ASSERT_GT(data, 0);
+  ASSERT_GT(ssnd, 0);
+  ASSERT_GT(comm, 0);
+  const auto poke = [&](const char* file, long at, const char* bytes) {
+    Make(std::string("printf '") + bytes + "' | dd of=" + file +
+         " bs=1 seek=" + std::to_string(at) + " conv=notrunc status=none");
+  };
+  // Recordings that were never closed: the WAVE "data" size still 0; the
+  // AIFF "SSND" holding only its offset fields, "COMM" without frames.
+  poke("r.wav", data + 4, "\\000\\000\\000\\000");
+  poke("r.aiff", ssnd + 4, "\\000\\000\\000\\010");
+  poke("r.aiff", comm + 10, "\\000\\000\\000\\000");
+  for (const char* file : {"r.wav", "r.aiff"}) {
+    SCOPED_TRACE(file);
+    EXPECT_EQ(JsonValue(Tool(std::string("info --json ") + file).out, "frames"), "0");
+    const Result r = Tool(std::string("recover ") + file);
+    ASSERT_EQ(r.status, 0) << r.err;
+    EXPECT_NE(r.out.find("repaired, 4000 frames"), std::string::npos) << r.out;
+    EXPECT_EQ(Output(std::string("soxi -s ") + file), "4000");
+    EXPECT_NE(Tool(std::string("recover ") + file).out.find("header whole"), std::string::npos);
+  }
+  // The repaired headers are byte for byte those sox wrote.
+  EXPECT_EQ(Slurp(P("r.wav")), Slurp(P("whole.wav")));
+  EXPECT_EQ(Slurp(P("r.aiff")), Slurp(P("whole.aiff")));
 }
 
 // Tones and conversions as sox and libsndfile read them.

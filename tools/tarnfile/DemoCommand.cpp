@@ -222,31 +222,42 @@ class Demo {
     return "bext and iXML written in place, audio MD5 unchanged";
   }
 
-  // A recording whose "data" size was never written, repaired from the
-  // file's length.
+  // Recordings whose sizes were never written (a WAVE "data" size of 0; an
+  // AIFF "SSND" that holds only its offset fields and no frame count in
+  // "COMM"), repaired from the files' lengths.
   std::string Recover() {
-    const std::string path = Path("unclosed.wav");
-    fs::copy_file(Path("tone-s16.wav"), path, fs::copy_options::overwrite_existing);
-    FileScope scope(path);
-    std::int64_t sizeField = 0;
-    {
-      const SoundFile file = OpenSoundFile(path);
-      sizeField = MakeChunkEditor(file)->GetOffsetToChunkStart(MakeRIFFType("data")) + 4;
+    std::string what;
+    for (const char* name : {"tone-s16.wav", "tone-s16.aiff"}) {
+      const std::string path = Path(std::string("unclosed-") + name);
+      fs::copy_file(Path(name), path, fs::copy_options::overwrite_existing);
+      FileScope scope(path);
+      const std::string md5 = AudioPayloadMD5(OpenSoundFile(path));
+      {
+        const SoundFile file = OpenSoundFile(path);
+        const auto editor = MakeChunkEditor(file);
+        tarn::CFileStream stream(SpecForPath(path));
+        stream.Open(tarn::kTCLReadWriteMode);
+        if (file.IsWAVE()) {
+          stream.MoveTo(editor->GetOffsetToChunkStart(MakeRIFFType("data")) + 4);
+          stream.PutRawDataToStream("\0\0\0\0", 4);
+        } else {
+          stream.MoveTo(editor->GetOffsetToChunkStart(MakeRIFFType("SSND")) + 4);
+          stream.PutRawDataToStream("\0\0\0\x08", 4);
+          stream.MoveTo(editor->GetOffsetToChunkStart(MakeRIFFType("COMM")) + 10);
+          stream.PutRawDataToStream("\0\0\0\0", 4);
+        }
+        stream.Close();
+      }
+      std::printf("   %s: the header says %lld frames after the crash\n", name,
+                  static_cast<long long>(OpenSoundFile(path).frames));
+      RunRecover({path});
+      const SoundFile back = OpenSoundFile(path);
+      if (back.frames != kFrames || AudioPayloadMD5(back) != md5)
+        throw UsageError("recovery did not find every frame");
+      what += std::string(what.empty() ? "" : ", ") + FormatName(back.container) + " 0 -> " +
+              std::to_string(back.frames) + " frames";
     }
-    {
-      tarn::CFileStream stream(SpecForPath(path));
-      stream.Open(tarn::kTCLReadWriteMode);
-      stream.MoveTo(sizeField);
-      static constexpr std::uint8_t kZeros[4] = {};
-      stream.PutRawDataToStream(kZeros, 4);
-      stream.Close();
-    }
-    const std::int64_t lost = OpenSoundFile(path).frames;
-    std::printf("   header says %lld frames after the crash\n", static_cast<long long>(lost));
-    RunRecover({path});
-    const std::int64_t back = OpenSoundFile(path).frames;
-    if (back != kFrames) throw UsageError("recovery did not find every frame");
-    return "data size 0 -> " + std::to_string(back) + " frames";
+    return what + ", audio MD5 as before";
   }
 
   // A RIFF recording grown (sparsely) past 4 GiB of audio: the format
