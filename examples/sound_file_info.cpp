@@ -1,11 +1,12 @@
-// Prints a sound file's header facts through its format object and lists
-// its chunks with the chunk editor.
+// Prints a WAVE file's header facts and peak level, read through
+// SoundFileReader, and lists its chunks with the chunk editor.
+#include <cmath>
 #include <cstdio>
+#include <vector>
 
 #include "tarn/Audio/SoundFileFormats/RIFFFileEditor.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
-#include "tarn/Audio/SoundFileFormats/SoundFileFormat.h"
-#include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
+#include "tarn/Audio/SoundFileReader.h"
 #include "tarn/Errors/TarnError.h"
 
 int main(int argc, char** argv) {
@@ -15,11 +16,16 @@ int main(int argc, char** argv) {
   }
   try {
     const tarn::FileSpecification spec{tarn::UString(argv[1])};
-    auto format = tarn::SoundFileFormatCache::Instance().GetFormat(spec);
-    const tarn::SoundFileAttributes a = format->GetFileAttributes();
-    std::printf("%d channels, %g Hz, %d bytes per sample, %lld frames, audio at byte %d\n",
-                a.mNumChannels, a.mSampleRate, a.mBytesPerSample,
-                static_cast<long long>(format->GetLengthInFrames().AsLongLong()), a.mOffsetToAudio);
+    tarn::SoundFileReader file(spec);
+    std::vector<std::vector<float>> channels;  // one vector of floats per channel
+    file.Read(0, file.GetLengthInFrames(), channels);
+    float peak = 0;
+    for (const auto& channel : channels)
+      for (float sample : channel) peak = std::max(peak, std::fabs(sample));
+    std::printf("%d channels, %g Hz, %lld frames, audio at byte %d, peak %.3f\n",
+                file.GetNumChannels(), file.GetSampleRate(),
+                static_cast<long long>(file.GetLengthInFrames().AsLongLong()),
+                file.GetAttributes().mOffsetToAudio, peak);
 
     tarn::RIFFFileEditor editor(spec, tarn::kRIFFLittleEndian, tarn::GetWaveRIFFFormatHandler());
     editor.ReadChunkLocations(nullptr);
