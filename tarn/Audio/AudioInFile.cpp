@@ -104,12 +104,11 @@ void AudioInFile::OutOfOrderReadAsync(void* buffer, SampleCount start, SampleCou
   PlatformAudioFile& file = OpenFile();
   std::int64_t position = 0, count = 0;
   PreflightReadRequest(start, frames, position, count);
-  file.AsyncRead(buffer, static_cast<std::uint64_t>(firstByte_ + position),
-                 static_cast<std::uint64_t>(count),
-                 [this, buffer, completion = std::move(completion)](std::int32_t status,
-                                                                    std::int32_t bytes) {
-                   CompleteRead(buffer, status, bytes, completion);
-                 });
+  file.AsyncRead(
+      buffer, static_cast<std::uint64_t>(firstByte_ + position), static_cast<std::uint64_t>(count),
+      [this, buffer, completion = std::move(completion)](std::int32_t status, std::int32_t bytes) {
+        CompleteRead(buffer, status, bytes, completion);
+      });
 }
 
 void AudioInFile::CompleteRead(void* buffer, std::int32_t status, std::int32_t bytes,

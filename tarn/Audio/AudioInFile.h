@@ -86,8 +86,8 @@ class AudioInFile : public AudioFile, public AsyncAudioReader {
   }
 
  private:
-  std::int64_t firstByte_;  // file offset of the stretch's frame 0
-  std::int64_t dataEnd_;    // file offset after the last readable byte; >= firstByte_
+  std::int64_t firstByte_;         // file offset of the stretch's frame 0
+  std::int64_t dataEnd_;           // file offset after the last readable byte; >= firstByte_
   std::int64_t readPosition_ = 0;  // bytes from firstByte_; in [0, dataEnd_ - firstByte_]
   HostChannelOrder channelOrder_;
   std::shared_ptr<AudioReadPerformanceMonitor> monitor_;

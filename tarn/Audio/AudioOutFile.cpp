@@ -45,7 +45,8 @@ AudioOutFile::AudioOutFile(std::shared_ptr<SoundFileFormat> format, PlatformFile
     : BasicAudioOutFile(
           format->GetFile(),
           CheckedAttributes(format->GetFileAttributes(), format->GetFile()).mOffsetToAudio,
-          ::tarn::AudioFile::LSBOrderToByteSwapOption(format->GetFileAttributes().mSamplesAreLSBFirst),
+          ::tarn::AudioFile::LSBOrderToByteSwapOption(
+              format->GetFileAttributes().mSamplesAreLSBFirst),
           FormatOf(format->GetFileAttributes()), format->GetLengthInFrames(), options),
       format_(std::move(format)) {}
 

@@ -42,11 +42,11 @@ void BasicAudioOutFile::Write(const void* buffer, SampleCount frames) {
     if (bytes > scratchCapacity_) {
       scratchRaw_.reset();
       scratchCapacity_ = 0;
-      scratchRaw_.reset(new unsigned char[static_cast<std::size_t>(bytes) +
-                                          PlatformAudioFile::kBlockSize]);
+      scratchRaw_.reset(
+          new unsigned char[static_cast<std::size_t>(bytes) + PlatformAudioFile::kBlockSize]);
       const auto raw = reinterpret_cast<std::uintptr_t>(scratchRaw_.get());
-      scratch_ = scratchRaw_.get() + (PlatformAudioFile::kBlockSize -
-                                      (raw & (PlatformAudioFile::kBlockSize - 1)));
+      scratch_ = scratchRaw_.get() +
+                 (PlatformAudioFile::kBlockSize - (raw & (PlatformAudioFile::kBlockSize - 1)));
       scratchCapacity_ = bytes;
     }
     std::memcpy(scratch_, buffer, static_cast<std::size_t>(bytes));
@@ -108,8 +108,8 @@ bool BasicAudioOutFile::ShouldExtendFile(SampleCount& newLength, std::int64_t by
 void BasicAudioOutFile::SetEOF(SampleCount frames) {
   PlatformAudioFile& file = OpenFile();
   const std::int64_t count = frames.AsLongLong();
-  if (count < 0 || count > (std::numeric_limits<std::int64_t>::max() - GetHeaderSize()) /
-                               GetFrameSize())
+  if (count < 0 ||
+      count > (std::numeric_limits<std::int64_t>::max() - GetHeaderSize()) / GetFrameSize())
     FailOSErr(kParamErr);
   FailOSErr(file.SetSize(static_cast<std::uint64_t>(GetHeaderSize() + count * GetFrameSize())));
   framesWritten_ = std::min(framesWritten_.AsLongLong(), count);

@@ -17,6 +17,13 @@ constexpr std::uint64_t kBlockMask = kBlock - 1;
 
 bool IsAligned(std::uint64_t value) noexcept { return (value & kBlockMask) == 0; }
 
+// Whether [position, position + count) rounded out to whole blocks is a
+// range of signed 64-bit file offsets.
+bool FitsInOffsets(std::uint64_t position, std::uint64_t count) noexcept {
+  constexpr std::uint64_t kMax = std::uint64_t(std::numeric_limits<std::int64_t>::max()) - kBlock;
+  return position <= kMax && count <= kMax - position;
+}
+
 // The process-wide job thread of asynchronous reads, started on first use.
 class ReaderThread {
  public:
@@ -25,7 +32,8 @@ class ReaderThread {
  private:
   friend class tarn::Singleton<ReaderThread>;
   ReaderThread()
-      : thread_(UString("PlatformAudioFile Reader Thread"), TarnJobThread::kRunRemainingJobsAtExit) {
+      : thread_(UString("PlatformAudioFile Reader Thread"),
+                TarnJobThread::kRunRemainingJobsAtExit) {
     thread_.Start();
   }
   TarnJobThread thread_;
@@ -52,9 +60,8 @@ class PlatformAudioFile::Impl {
  private:
   [[nodiscard]] bool Direct(const void* buffer, std::uint64_t count,
                             std::uint64_t position) const noexcept {
-    return !driver_->NeedsAlignment() ||
-           (IsAligned(reinterpret_cast<std::uintptr_t>(buffer)) && IsAligned(count) &&
-            IsAligned(position));
+    return !driver_->NeedsAlignment() || (IsAligned(reinterpret_cast<std::uintptr_t>(buffer)) &&
+                                          IsAligned(count) && IsAligned(position));
   }
   // Grows (never shrinks) the bounce buffer to `bytes`; old contents go.
   void ReserveBounce(std::uint64_t bytes);
@@ -87,8 +94,7 @@ FileResult PlatformAudioFile::Impl::Read(void* buffer, std::uint64_t count,
                                          std::optional<std::uint64_t> at) {
   if (!driver_) return {kFileParamErr, 0};
   const std::uint64_t position = at.value_or(position_);
-  if (count > std::numeric_limits<std::uint64_t>::max() - position - kBlock)
-    return {kFileParamErr, 0};
+  if (!FitsInOffsets(position, count)) return {kFileParamErr, 0};
   if (Direct(buffer, count, position)) {
     if (const FileStatus status = driver_->SetFilePointer(position); status != kFileOK)
       return {status, 0};
@@ -118,8 +124,12 @@ FileStatus PlatformAudioFile::Impl::Write(const void* buffer, std::uint64_t coun
                                           std::optional<std::uint64_t> at) {
   if (!driver_) return kFileParamErr;
   const std::uint64_t position = at.value_or(position_);
-  if (count > std::numeric_limits<std::uint64_t>::max() - position - kBlock) return kFileParamErr;
+  if (!FitsInOffsets(position, count)) return kFileParamErr;
   const std::uint64_t newEnd = position + count;
+  if (count == 0) {  // nothing to move: above all, no block to pad the file with
+    position_ = position;
+    return kFileOK;
+  }
   if (Direct(buffer, count, position)) {
     if (const FileStatus status = driver_->SetFilePointer(position); status != kFileOK)
       return status;
@@ -129,13 +139,14 @@ FileStatus PlatformAudioFile::Impl::Write(const void* buffer, std::uint64_t coun
   }
   const std::uint64_t alignedStart = position & ~kBlockMask;
   const std::uint64_t alignedEnd = (newEnd + kBlockMask) & ~kBlockMask;
-  bool metEndOfFile = false;
+  // When the pre-read met the end of the file: where the file ended.
+  std::optional<std::uint64_t> oldEnd;
   ReserveBounce(alignedEnd - alignedStart);
   if (alignedStart != position || alignedEnd != newEnd) {
     // Read-modify-write of the partial blocks at either edge.
     const FileResult pre = FillBounce(alignedStart, alignedEnd);
     if (pre.status == kFileEOFErr) {
-      metEndOfFile = true;
+      oldEnd = alignedStart + static_cast<std::uint64_t>(pre.bytes);
       // Filler past the end of the file reads as zeros, as a hole would.
       std::memset(bounce_ + pre.bytes, 0,
                   static_cast<std::size_t>(alignedEnd - alignedStart -
@@ -150,9 +161,12 @@ FileStatus PlatformAudioFile::Impl::Write(const void* buffer, std::uint64_t coun
   if (const FileStatus status = driver_->Write(bounce_, alignedEnd - alignedStart);
       status != kFileOK)
     return status;
-  // The filler of the last block must not lengthen the file.
-  if (metEndOfFile) {
-    if (const FileStatus status = driver_->SetFileSize(newEnd); status != kFileOK) return status;
+  // The filler of the last block must not lengthen the file (nor may a
+  // write that ends inside the file's last block shorten it).
+  if (oldEnd) {
+    if (const FileStatus status = driver_->SetFileSize(std::max(newEnd, *oldEnd));
+        status != kFileOK)
+      return status;
   }
   position_ = newEnd;
   return kFileOK;
@@ -173,7 +187,8 @@ struct ASyncReadParams {
 
 PlatformAudioFile::PlatformAudioFile(const FileSpecification& file, bool writable,
                                      PlatformFileOptions options)
-    : impl_(std::make_shared<Impl>(std::make_shared<PlatformFileDriver>(file, writable, options))) {}
+    : impl_(std::make_shared<Impl>(std::make_shared<PlatformFileDriver>(file, writable, options))) {
+}
 
 PlatformAudioFile::PlatformAudioFile(std::shared_ptr<IFileDriver> driver)
     : impl_(std::make_shared<Impl>(std::move(driver))) {}
@@ -208,7 +223,9 @@ void PlatformAudioFile::AsyncRead(void* buffer, std::uint64_t position, std::uin
 
 std::uint64_t PlatformAudioFile::GetPosition() const noexcept { return impl_->position_; }
 
-void PlatformAudioFile::SetPosition(std::uint64_t position) noexcept { impl_->position_ = position; }
+void PlatformAudioFile::SetPosition(std::uint64_t position) noexcept {
+  impl_->position_ = position;
+}
 
 FileResult PlatformAudioFile::GetSize() {
   if (!impl_->driver_) return {kFileParamErr, 0};

@@ -219,6 +219,34 @@ inline std::vector<SampleCase> SampleTable(SampleFormat f) {
   }
 }
 
+// The float table's samples (-1.0, 1.0, 0.0, 1.5, -0.25) in each format:
+// full scale clips, -1.0 is the most negative value, the 8-bit offset form
+// is shifted by 128, and a negative 24-bit result that is not whole moves
+// down one more step (-0.25 is 0xDFFFFF00).
+struct FloatCase {
+  SampleFormat to;
+  std::vector<Bytes> expected;
+};
+inline const FloatCase kFromFloat[] = {
+    {kSamp8Offset, {{0x00}, {0xFF}, {0x80}, {0xFF}, {0x60}}},
+    {kSamp8, {{0x80}, {0x7F}, {0x00}, {0x7F}, {0xE0}}},
+    {kSamp16, {{0x00, 0x80}, {0xFF, 0x7F}, {0x00, 0x00}, {0xFF, 0x7F}, {0x00, 0xE0}}},
+    {kSamp24,
+     {{0x00, 0x00, 0x80}, {0xFF, 0xFF, 0x7F}, {0, 0, 0}, {0xFF, 0xFF, 0x7F}, {0xFF, 0xFF, 0xDF}}},
+    {kSampUnpacked24,
+     {{0, 0, 0, 0x80},
+      {0, 0xFF, 0xFF, 0x7F},
+      {0, 0, 0, 0},
+      {0, 0xFF, 0xFF, 0x7F},
+      {0, 0xFF, 0xFF, 0xDF}}},
+    {kSampFloat32,
+     {{0, 0, 0x80, 0xBF},
+      {0, 0, 0x80, 0x3F},
+      {0, 0, 0, 0},
+      {0, 0, 0xC0, 0x3F},
+      {0, 0, 0x80, 0xBE}}},
+};
+
 // Interleaved frames whose sample (frame i, channel c) is table entry
 // (i * 3 + c) % size, so neighbouring channels and frames differ.
 inline std::size_t CaseIndex(std::int64_t frame, int channel, std::size_t size) {

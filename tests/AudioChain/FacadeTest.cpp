@@ -126,6 +126,25 @@ TEST(Facade, AsyncReadsAndMonoSum) {
                                                     Sample16(100 + i, 2) / 32768.0f);
 }
 
+TEST(Facade, FormatsMakeFloatingPointReaders) {
+  ScratchDir dir;
+  for (const auto& t : kTypes) {
+    SCOPED_TRACE(t.extension);
+    SoundFileReader file(Spec(Write16(dir.path, t, 2, 3000)));
+    auto reader = file.GetFileFormat()->MakeFloatingPointReader({1000, 2500}, file.GetSampleRate());
+    ASSERT_EQ(reader->GetFormat().mSampleFormat, kSampFloat32);
+    ASSERT_EQ(reader->GetLengthInFrames(), 1500);
+    std::vector<float> l(2000), r(2000);
+    void* p[] = {l.data(), r.data()};
+    ASSERT_EQ(reader->OutOfOrderRead(p, 1499, 10), 1);
+    EXPECT_EQ(l[0], Sample16(2499, 0) / 32768.0f);
+    EXPECT_EQ(r[0], Sample16(2499, 1) / 32768.0f);
+    ASSERT_EQ(reader->Read(p, 2000), 1500);
+    for (int i = 0; i < 1500; ++i)
+      ASSERT_EQ(r[static_cast<std::size_t>(i)], Sample16(1000 + i, 1) / 32768.0f);
+  }
+}
+
 TEST(Facade, FlushLeavesACompleteFileAndRecordingsCanOutgrowRIFF) {
   ScratchDir dir;
   for (const auto& t : kTypes) {

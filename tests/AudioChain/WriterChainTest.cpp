@@ -60,32 +60,6 @@ TEST(WriterChain, InterleavesEveryFormatAndChannelCount) {
     }
 }
 
-// The float table's samples (-1.0, 1.0, 0.0, 1.5, -0.25) as each file
-// format stores them.
-struct FloatCase {
-  SampleFormat to;
-  std::vector<Bytes> expected;
-};
-const FloatCase kFromFloat[] = {
-    {kSamp8Offset, {{0x00}, {0xFF}, {0x80}, {0xFF}, {0x60}}},
-    {kSamp8, {{0x80}, {0x7F}, {0x00}, {0x7F}, {0xE0}}},
-    {kSamp16, {{0x00, 0x80}, {0xFF, 0x7F}, {0x00, 0x00}, {0xFF, 0x7F}, {0x00, 0xE0}}},
-    {kSamp24,
-     {{0x00, 0x00, 0x80}, {0xFF, 0xFF, 0x7F}, {0, 0, 0}, {0xFF, 0xFF, 0x7F}, {0xFF, 0xFF, 0xDF}}},
-    {kSampUnpacked24,
-     {{0, 0, 0, 0x80},
-      {0, 0xFF, 0xFF, 0x7F},
-      {0, 0, 0, 0},
-      {0, 0xFF, 0xFF, 0x7F},
-      {0, 0xFF, 0xFF, 0xDF}}},
-    {kSampFloat32,
-     {{0, 0, 0x80, 0xBF},
-      {0, 0, 0x80, 0x3F},
-      {0, 0, 0, 0},
-      {0, 0, 0xC0, 0x3F},
-      {0, 0, 0x80, 0xBE}}},
-};
-
 TEST(WriterChain, ConvertsFloatToEveryFileFormat) {
   constexpr std::int64_t kFrames = 12000;  // more than the staging buffer holds at 8 ch
   for (const auto& c : kFromFloat)

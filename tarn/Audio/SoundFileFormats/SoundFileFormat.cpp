@@ -23,8 +23,8 @@ SoundFileFormat::~SoundFileFormat() = default;
 
 std::vector<double> SoundFileFormat::GetCachedRates() { return {}; }
 
-std::unique_ptr<AsyncAudioReader> SoundFileFormat::MakeReader(
-    const TimeRangeOf<SampleCount>& range, double rate) {
+std::unique_ptr<AsyncAudioReader> SoundFileFormat::MakeReader(const TimeRangeOf<SampleCount>& range,
+                                                              double rate) {
   if (FormatRequiresExternalConversion())
     sffimpl::FailWithText("SoundFileFormat", kNotAvailableErr,
                           "this file is read through the outside converter only", file_);

@@ -94,8 +94,10 @@ class SoundFileFormat : public std::enable_shared_from_this<SoundFileFormat> {
   // MakeWriter gives an AudioOutFile appending after the present audio (chunks
   // after the audio are removed first) and needs this object to be owned by
   // a shared_ptr (-50 otherwise). Other sample layouts throw -50; files
-  // that need the outside converter, and MakeFloatingPointReader here,
-  // throw kNotAvailableErr.
+  // that need the outside converter throw kNotAvailableErr.
+  // MakeFloatingPointReader is MakeReader deinterleaved into one float
+  // buffer per channel (DeinterleavingReader, ConvertingReader) and throws
+  // what MakeReader throws.
   [[nodiscard]] virtual std::unique_ptr<AsyncAudioReader> MakeReader(
       const TimeRangeOf<SampleCount>& range, double rate);
   [[nodiscard]] virtual std::unique_ptr<AudioReader> MakeFloatingPointReader(
