@@ -29,10 +29,12 @@ Decoded Decode(const std::filesystem::path& path, std::int64_t first = 0, std::i
   EXPECT_NE(file, nullptr) << "libsndfile cannot open " << path << ": " << sf_strerror(nullptr);
   if (file == nullptr) return {};
   Decoded d{info.frames, info.channels, info.format & SF_FORMAT_TYPEMASK, {}};
-  const int subtype = info.format & SF_FORMAT_SUBMASK;
-  const int sampleSize = subtype == SF_FORMAT_PCM_16 ? 2 : subtype == SF_FORMAT_PCM_24 ? 3 : 4;
   if (count < 0) count = info.frames - first;
-  d.raw.resize(std::size_t(count * info.channels * sampleSize));
+  const int subtype = info.format & SF_FORMAT_SUBMASK;  // 16-bit, 24-bit or 32-bit here
+  d.raw.resize(std::size_t(count * info.channels *
+                           (subtype == SF_FORMAT_PCM_16   ? 2
+                            : subtype == SF_FORMAT_PCM_24 ? 3
+                                                          : 4)));
   if (sf_seek(file, first, SEEK_SET) != first) d.raw.clear();
   d.raw.resize(std::size_t(sf_read_raw(file, d.raw.data(), sf_count_t(d.raw.size()))));
   sf_close(file);
@@ -60,6 +62,7 @@ TEST(AudioOutFile, TheHeaderIsRightAfterEveryFlushAndTheReaderGivesTheFramesBack
       for (std::int64_t frames : {37, 1000, 3, 4097}) {
         const Bytes chunk = Noise(std::size_t(frames * frameSize), std::uint32_t(frames));
         out.Write(chunk.data(), frames);
+        EXPECT_EQ(chunk, Noise(chunk.size(), std::uint32_t(frames))) << "swapped in place";
         written.insert(written.end(), chunk.begin(), chunk.end());
         out.Flush();
         const Decoded d = Decode(path);
