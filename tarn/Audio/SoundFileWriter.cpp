@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "tarn/Audio/AudioOutFile.h"
 #include "tarn/Audio/ConvertingWriter.h"
 #include "tarn/Audio/InterleavingWriter.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormat.h"
@@ -42,7 +43,9 @@ SoundFileWriter::SoundFileWriter(const FileSpecification& file, const Settings& 
   hint.mFileType = type;
   attributes_ = format_->CreateFileOnDisk(wanted, 0, settings.recording, hint);
 
-  std::shared_ptr<InterAudioWriter> out = format_->MakeWriter();
+  PlatformFileOptions options;
+  options.mCachingMode = settings.unbuffered ? kUnbufferedCaching : kCachedCaching;
+  std::shared_ptr<InterAudioWriter> out = std::make_shared<AudioOutFile>(format_, options);
   attributes_.mSampleFormat = out->GetFormat().mSampleFormat;
   converter_ =
       std::make_shared<ConvertingWriter>(std::move(out), settings.clientFormat, settings.dither);

@@ -12,7 +12,7 @@
 //   out.Close();
 //
 // The file is made by its format object from SoundFileFormatCache::Instance()
-// (CreateFileOnDisk, then MakeWriter): after every Flush its header is right
+// (CreateFileOnDisk, then an AudioOutFile): after every Flush its header is right
 // and any program reads every frame written so far. A "WAVE" recording
 // (Settings::recording) that grows past what RIFF's 32-bit sizes hold is
 // switched to Wave64 in place by its format during a Flush, without
@@ -57,6 +57,9 @@ class SoundFileWriter {
     // Marks the file as a recording; a WAVE recording can switch to Wave64
     // in place when it outgrows RIFF.
     bool recording = true;
+    // Writes bypass the system's file cache (unbuffered, whole blocks where
+    // the frame size allows); false writes through the cache.
+    bool unbuffered = true;
   };
 
   // Creates `file` (replacing what is there) and opens it for writing.

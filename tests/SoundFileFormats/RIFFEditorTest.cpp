@@ -317,6 +317,25 @@ class FileModel {
     }
   }
 
+  // JunkChunk: the first chunk of the tag and every marked chunk retire at
+  // once; false when no chunk has the tag.
+  bool JunkNow(RIFFType tag) {
+    const auto first = std::find_if(chunks_.begin(), chunks_.end(),
+                                    [tag](const auto& ch) { return ch.tag == tag; });
+    if (first == chunks_.end()) return false;
+    first->junkMark = true;
+    bool seenAudio = false;
+    std::vector<ModelChunk> kept;
+    for (ModelChunk& chunk : chunks_) {
+      if (chunk.tag == AudioTagOf(c_)) seenAudio = true;
+      if (chunk.junkMark && seenAudio) continue;
+      if (chunk.junkMark) chunk.tag = kJunk;
+      kept.push_back(chunk);
+    }
+    chunks_ = std::move(kept);
+    return true;
+  }
+
   void StripAfterAudio() {
     const auto audio = std::find_if(chunks_.begin(), chunks_.end(),
                                     [this](const auto& ch) { return ch.tag == AudioTagOf(c_); });
@@ -373,7 +392,7 @@ TEST(RIFFEditorEdits, RandomEditSequencesMatchTheModel) {
       editor.ReadChunkLocations(nullptr);
       std::string log;
       for (int step = pick(4) + 1; step > 0; --step) {
-        const int kind = pick(6);
+        const int kind = pick(7);
         const RIFFType tag = pool[pick(4)];
         log += RIFFTypeToString(tag) + ":" + std::to_string(kind) + " ";
         SCOPED_TRACE(std::string(NameOf(c)) + " round " + std::to_string(round) + " " + log);
@@ -391,6 +410,14 @@ TEST(RIFFEditorEdits, RandomEditSequencesMatchTheModel) {
           ASSERT_EQ(ReadFile(path), want);
           WriteFile(path, model.Image());
           continue;
+        } else if (kind == 6) {
+          if (!model.JunkNow(tag)) {
+            const auto error = ErrorOf([&] { editor.JunkChunk(tag, AudioTagOf(c)); });
+            ASSERT_TRUE(error);
+            EXPECT_EQ(error->GetIntErrorCode(), RIFFFileEditor::kChunkNotFound);
+          } else {
+            editor.JunkChunk(tag, AudioTagOf(c));
+          }
         } else {
           const Bytes payload = Pattern(static_cast<std::size_t>(pick(24)), 200);
           model.Add(tag, payload);

@@ -311,15 +311,16 @@ std::int64_t RIFFFileEditor::WriteSegment(const ChunkData& chunk, const UUIDObj&
   return stream_->Position();
 }
 
-void RIFFFileEditor::DetermineSegmentActions(const ChunkData& chunk, RIFFType audioTag) {
-  const std::int64_t newLength = WAVEWriter::PadDataLength(chunk.data.GetSize(), wave64_);
+void RIFFFileEditor::DetermineSegmentActions(const ChunkData* chunk, RIFFType audioTag) {
+  const std::int64_t newLength =
+      chunk ? WAVEWriter::PadDataLength(chunk->data.GetSize(), wave64_) : 0;
   bool seenAudio = false;
   for (auto& [info, action] : chunks_) {
     if (action != kJunkSegment) action = kKeepSegment;
     if (info.tag == audioTag) {
       seenAudio = true;
       if (audioRunsToEnd_) action = kFixAudioHeader;
-    } else if (info.tag == chunk.tag) {
+    } else if (chunk && info.tag == chunk->tag) {
       if (newLength == info.length)
         action = kOverwriteSegment;
       else
@@ -378,6 +379,24 @@ void RIFFFileEditor::AddChunkData(const ChunkData& chunk, RIFFType audioTag) {
     if (uuid.IsClear() || MaybeTranslateRiffType(kJunkTag).IsClear()) Failure(kParamErr);
     ConfirmUUIDMap();
   }
+  ApplySegmentActions(&chunk, uuid, audioTag);
+}
+
+void RIFFFileEditor::JunkChunk(RIFFType tag, RIFFType audioTag) {
+  std::lock_guard hold(lock_);
+  EnsureListed();
+  if (FindChunk(tag) == chunks_.end())
+    FailFormatError("RIFFFileEditor", kChunkNotFound, stream_->GetSpecification());
+  if (wave64_) {
+    if (MaybeTranslateRiffType(kJunkTag).IsClear()) Failure(kParamErr);
+    ConfirmUUIDMap();
+  }
+  MaybeJunkSegment(tag);
+  ApplySegmentActions(nullptr, UUIDObj(), audioTag);
+}
+
+void RIFFFileEditor::ApplySegmentActions(const ChunkData* chunk, const UUIDObj& uuid,
+                                         RIFFType audioTag) {
   DetermineSegmentActions(chunk, audioTag);
   Access access(*stream_, kTCLReadWriteMode);
 
@@ -403,7 +422,7 @@ void RIFFFileEditor::AddChunkData(const ChunkData& chunk, RIFFType audioTag) {
       case kOverwriteSegment:
         // Behind a cut chunk the new bytes go where this one moves to.
         info.offset -= shift;
-        OverwriteThisSegment(info, chunk, uuid);
+        OverwriteThisSegment(info, *chunk, uuid);
         written = true;
         break;
       case kRemoveSegment:
@@ -428,13 +447,13 @@ void RIFFFileEditor::AddChunkData(const ChunkData& chunk, RIFFType audioTag) {
     end = info.tag == kNullTag ? info.offset : info.offset + headerSize + info.length;
   }
 
-  if (written && removed) {
+  if ((written || !chunk) && removed) {
     // Chunks moved back over a cut one: the file ends where the last kept
     // chunk now ends, and the container says so.
     stream_->MoveTo(GetIDSize());
     WriteLength(end - headerSize);
     stream_->Truncate(end);
-  } else if (!written) {
+  } else if (!written && chunk) {
     const std::int64_t fileLength = stream_->Size();
     const std::int64_t paddedLength = WAVEWriter::PadDataLength(fileLength, wave64_);
     if (end > fileLength && paddedLength > fileLength && paddedLength >= end) {
@@ -444,12 +463,12 @@ void RIFFFileEditor::AddChunkData(const ChunkData& chunk, RIFFType audioTag) {
       stream_->PutRawDataToStream(kZeros, static_cast<int>(paddedLength - fileLength));
     }
     stream_->MoveTo(end);
-    const std::int64_t newEnd = WriteSegment(chunk, uuid);
+    const std::int64_t newEnd = WriteSegment(*chunk, uuid);
     stream_->MoveTo(GetIDSize());
     WriteLength(newEnd - headerSize);
     stream_->Truncate(newEnd);
     chunks_.emplace_back(
-        ChunkInfo{chunk.tag, wave64_ ? uuid : UUIDObj(), end, newEnd - end - headerSize},
+        ChunkInfo{chunk->tag, wave64_ ? uuid : UUIDObj(), end, newEnd - end - headerSize},
         kKeepSegment);
   }
   if (removed) RemoveOverwrittenChunks();

@@ -53,7 +53,7 @@
 // chunks before it stay listed. An audio chunk that large is listed as
 // running to the end of the file (AudioRunsToEndOfFile).
 //
-// Threads: ReadChunkData, AddChunkData, CountPostAudioChunks,
+// Threads: ReadChunkData, AddChunkData, JunkChunk, CountPostAudioChunks,
 // GetNthPostAudioChunks, RemoveTrailingMetaData and Reset take the editor's
 // lock for their whole duration. The listing, HasChunk,
 // GetOffsetToChunkStart, MaybeJunkSegment and UpdateUUIDsFromTags take none:
@@ -201,6 +201,13 @@ class RIFFFileEditor {
   // Marks the first chunk with the tag to become junk at the next
   // AddChunkData (in place before the audio, cut out after it).
   void MaybeJunkSegment(RIFFType tag);
+  // Retires the first chunk with the tag now, writing nothing new: before
+  // the audio it is renamed "JUNK" in place (size and payload kept); after
+  // the audio it is cut out, the chunks behind it move back, the container
+  // size is rewritten and the file is cut to its new end. Chunks marked by
+  // MaybeJunkSegment go the same way. Throws "RIFFFileEditor" 1 when there
+  // is no such chunk, and what AddChunkData throws for a damaged file.
+  void JunkChunk(RIFFType tag, RIFFType audioTag);
   // Cuts the file after the audio chunk (and its pad byte) and drops the
   // listed chunks there; nothing happens without an audio chunk or with
   // nothing after it. The container's size field is left as it is.
@@ -245,7 +252,10 @@ class RIFFFileEditor {
   void WriteRIFFType(RIFFType tag, const UUIDObj& uuid);
   void WriteLength(std::int64_t length);
   std::int64_t WriteSegment(const ChunkData& chunk, const UUIDObj& uuid);
-  void DetermineSegmentActions(const ChunkData& chunk, RIFFType audioTag);
+  // The actions of an edit that writes `chunk` (none: only junk marked
+  // chunks), and carrying them out.
+  void DetermineSegmentActions(const ChunkData* chunk, RIFFType audioTag);
+  void ApplySegmentActions(const ChunkData* chunk, const UUIDObj& uuid, RIFFType audioTag);
   void JunkThisSegment(ChunkInfo& info);
   void OverwriteThisSegment(ChunkInfo& info, const ChunkData& chunk, const UUIDObj& uuid);
   void MoveThisSegmentBack(ChunkInfo& info, std::int64_t shift);
