@@ -10,8 +10,8 @@
 //              (posix_fadvise DONTNEED) before each run: unbuffered against
 //              cached reads of ours.
 //   Write      the same frames from per-channel float into a new 24-bit
-//              file: ours through SoundFileWriter, libsndfile interleaving
-//              first and then sf_writef_float.
+//              file: ours through SoundFileWriter (cached and unbuffered),
+//              libsndfile interleaving first and then sf_writef_float.
 //   AsyncRead  the completion latency of one 4 KiB read from the page cache:
 //              PlatformAudioFile::AsyncRead on its reader thread against
 //              pread on a condition-variable worker thread.
@@ -105,8 +105,9 @@ void FillBlock(std::vector<std::vector<float>>& channels, std::int64_t first) {
           static_cast<float>(((first + i) * (c + 3)) % 16777216 - 8388608) / 8388608.0f;
 }
 
-void WriteOurs(const std::string& path, std::int64_t frames) {
+void WriteOurs(const std::string& path, std::int64_t frames, bool unbuffered) {
   SoundFileWriter::Settings settings;
+  settings.unbuffered = unbuffered;
   settings.numChannels = kChannels;
   settings.fileFormat = kSamp24;
   SoundFileWriter out(Spec(path), settings);
@@ -269,7 +270,8 @@ int main() {
   try {
     std::printf("AudioIOBench: %lld MiB of 24-bit stereo audio in %s\n",
                 static_cast<long long>(megabytes), dir.c_str());
-    const double writeOurs = TimeMedian(3, nothing, [&] { WriteOurs(ours, frames); });
+    const double writeOurs = TimeMedian(3, nothing, [&] { WriteOurs(ours, frames, false); });
+    const double writeUnbuffered = TimeMedian(3, nothing, [&] { WriteOurs(ours, frames, true); });
     const double writeTheirs = TimeMedian(3, nothing, [&] { WriteSndfile(theirs, frames); });
 
     WarmCache(ours);
@@ -293,6 +295,7 @@ int main() {
       std::printf("%-28s %10.3f %10.1f\n", name, s, mib / s);
     };
     row("write ours (float->s24)", writeOurs);
+    row("write ours unbuffered", writeUnbuffered);
     row("write libsndfile", writeTheirs);
     row("read ours cached", readOurs);
     row("read ours unbuffered (warm)", readUnbufferedWarm);
@@ -301,6 +304,7 @@ int main() {
     row("cold read ours unbuffered", coldUnbuffered);
     std::printf("\n");
     Report("Write", "libsndfile", writeOurs, writeTheirs, "s");
+    Report("WriteUnbuffered", "libsndfile", writeUnbuffered, writeTheirs, "s");
     Report("Read", "libsndfile", readOurs, readTheirs, "s");
     Report("ReadUnbuffered", "libsndfile", readUnbufferedWarm, readTheirs, "s");
     Report("ReadCold", "cached_cold", coldUnbuffered, coldCached, "s");

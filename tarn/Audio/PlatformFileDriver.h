@@ -46,7 +46,7 @@ inline constexpr int kCachedCaching = 0;
 inline constexpr int kUnbufferedCaching = 2;
 
 struct PlatformFileOptions {
-  int mCachingMode = kUnbufferedCaching;
+  int mCachingMode = kCachedCaching;
   // Report NeedsAlignment() true whatever the mode.
   bool mForceAlignment = false;
 };

@@ -58,8 +58,9 @@ class SoundFileWriter {
     // in place when it outgrows RIFF.
     bool recording = true;
     // Writes bypass the system's file cache (unbuffered, whole blocks where
-    // the frame size allows); false writes through the cache.
-    bool unbuffered = true;
+    // the frame size allows), as a long recording wants; by default they go
+    // through the cache.
+    bool unbuffered = false;
   };
 
   // Creates `file` (replacing what is there) and opens it for writing.
