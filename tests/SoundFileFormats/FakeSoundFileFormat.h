@@ -1,8 +1,9 @@
 #pragma once
-// A SoundFileFormat that keeps every base behaviour: it supplies only what
-// the base leaves to a concrete format, from plain fields, and records the
-// calls of the base's algorithms and metadata hooks in one log, so tests
-// see their order.
+// Formats that keep every base behaviour of SoundFileFormat.
+// StubSoundFileFormat supplies only what the base leaves to a concrete
+// format, from plain fields; FakeSoundFileFormat also records the calls of
+// the base's algorithms and metadata hooks in one log, so tests see their
+// order.
 
 #include <cstdint>
 #include <functional>
@@ -15,22 +16,13 @@
 
 namespace tarn::test {
 
-class FakeSoundFileFormat : public SoundFileFormat {
+class StubSoundFileFormat : public SoundFileFormat {
  public:
   using SoundFileFormat::SoundFileFormat;
 
-  // What the fake reports.
   SoundFileAttributes attributes{MakeRIFFType("WAVE"), 2, 48000.0, kSamp16, 2, 4, 44, true};
   SampleCount length{1000};
   std::uint32_t canonicalType = MakeRIFFType("WAVE");
-  std::uint32_t actualType = MakeRIFFType("WAVE");
-  bool switchToExtended = false;
-  // Called by WriteMetaDataToDisk; its result is the hook's.
-  std::function<bool()> onWrite = [] { return false; };
-  // Thrown by OpenMetaDataOnDisk when set.
-  bool failOpen = false;
-
-  std::vector<std::string> log;
 
   double GetNaturalRate() override { return attributes.mSampleRate; }
   SampleCount GetLengthInFrames() override { return length; }
@@ -39,7 +31,6 @@ class FakeSoundFileFormat : public SoundFileFormat {
   }
   void WriteRegionList(ReadWriteMetaDataAccess&, RCBlobMT, std::uint32_t) override {}
   std::uint32_t GetCanonicalFileType() override { return canonicalType; }
-  std::uint32_t GetActualFileType() override { return actualType; }
   std::uint32_t GetPerferredFileCreator() override { return MakeRIFFType("TARN"); }
   SoundFileAttributes GetFileAttributes() override { return attributes; }
   HostChannelOrder GetChannelOrder() override {
@@ -65,6 +56,23 @@ class FakeSoundFileFormat : public SoundFileFormat {
   void WriteNamedMetaData(ReadWriteMetaDataAccess&, const UString&, std::uint32_t,
                           RCBlobMT) override {}
 
+ private:
+  void AdjustLengthInHeader(const SoundFileAttributes&, SampleCount n) override { length = n; }
+};
+
+class FakeSoundFileFormat : public StubSoundFileFormat {
+ public:
+  using StubSoundFileFormat::StubSoundFileFormat;
+
+  std::uint32_t actualType = MakeRIFFType("WAVE");
+  bool switchToExtended = false;
+  // Called by WriteMetaDataToDisk; its result is the hook's.
+  std::function<bool()> onWrite = [] { return false; };
+  // Makes OpenMetaDataOnDisk throw.
+  bool failOpen = false;
+  std::vector<std::string> log;
+
+  std::uint32_t GetActualFileType() override { return actualType; }
   bool ShouldSwitchToExtendedFileFormat(const SampleCount& n) override {
     log.push_back("should-switch " + std::to_string(n.AsLongLong()));
     return switchToExtended;
@@ -72,9 +80,6 @@ class FakeSoundFileFormat : public SoundFileFormat {
   void SwitchToExtendedFileFormat(const SampleCount& n) override {
     log.push_back("switch " + std::to_string(n.AsLongLong()));
   }
-
-  // The base's protected helpers, for tests.
-  using SoundFileFormat::ChangeLengthInternal;
 
  protected:
   void ThrowOutCachedMetaDataPositions() override { log.push_back("throw-out"); }
@@ -94,45 +99,6 @@ class FakeSoundFileFormat : public SoundFileFormat {
     return onWrite();
   }
   void CloseMetaDataOnDisk() noexcept override { log.push_back("close"); }
-};
-
-// A format that keeps all base behaviours and supplies the pure operations
-// with fixed answers; no log, no hooks.
-class DefaultsSoundFileFormat : public SoundFileFormat {
- public:
-  using SoundFileFormat::SoundFileFormat;
-  double GetNaturalRate() override { return 44100.0; }
-  SampleCount GetLengthInFrames() override { return 0; }
-  std::unique_ptr<SoundFileRegionList> GetRegionList(ReadOnlyMetaDataAccess&) override {
-    return std::make_unique<SoundFileRegionList>();
-  }
-  void WriteRegionList(ReadWriteMetaDataAccess&, RCBlobMT, std::uint32_t) override {}
-  std::uint32_t GetCanonicalFileType() override { return MakeRIFFType("WAVE"); }
-  std::uint32_t GetPerferredFileCreator() override { return 0; }
-  SoundFileAttributes GetFileAttributes() override { return {}; }
-  HostChannelOrder GetChannelOrder() override { return {}; }
-  SoundFileAttributes CreateFileOnDisk(const SoundFileAttributes& a, SampleCount, bool,
-                                       const SoundFileAttributes&) override {
-    return a;
-  }
-  void SetRecordFlagMetaData(ReadWriteMetaDataAccess&, int) override {}
-  void WriteFileTempoData(ReadWriteMetaDataAccess&, float, short, short, short,
-                          const std::vector<std::int64_t>&, SampleCount, float) override {}
-  short NumberOfLoops(ReadOnlyMetaDataAccess&) override { return 0; }
-  void GetFileLoop(ReadOnlyMetaDataAccess&, short, SoundFileFormatLoop&) override {}
-  void AddFileLoops(ReadWriteMetaDataAccess&, const std::vector<SoundFileFormatLoop>&) override {}
-  bool HasMetaData(ReadOnlyMetaDataAccess&, std::uint32_t) override { return false; }
-  RCBlobMT ReadMetaData(ReadOnlyMetaDataAccess&, std::uint32_t) override { return {}; }
-  void WriteMetaData(ReadWriteMetaDataAccess&, std::uint32_t, RCBlobMT) override {}
-  void CleanMetaDataMods() override {}
-  RCBlobMT ReadNamedMetaData(ReadOnlyMetaDataAccess&, const UString&, std::uint32_t) override {
-    return {};
-  }
-  void WriteNamedMetaData(ReadWriteMetaDataAccess&, const UString&, std::uint32_t,
-                          RCBlobMT) override {}
-
- private:
-  void AdjustLengthInHeader(const SoundFileAttributes&, SampleCount) override {}
 };
 
 }  // namespace tarn::test
