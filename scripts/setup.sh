@@ -6,6 +6,7 @@ set -euo pipefail
 packages=(
   build-essential g++ clang cmake ninja-build ccache pkg-config git
   libicu-dev uuid-dev
+  libavformat-dev libavcodec-dev libavutil-dev
   googletest libgtest-dev libgmock-dev libbenchmark-dev
   g++-mingw-w64-x86-64-posix wine64
   libsndfile1-dev sndfile-programs sox ffmpeg
