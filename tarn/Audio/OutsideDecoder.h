@@ -10,8 +10,11 @@
 // frame: Seek goes to the nearest earlier seek point the container offers
 // (with the codec's pre-roll), decodes, and drops the frames before the
 // wanted one, so a frame reads the same whether reached by Seek or by
-// decoding from the start. Where the container's positions cannot be
-// trusted (raw MP3 and other unindexed streams), Seek decodes from the start.
+// decoding from the start. Where that cannot hold, a backward or far Seek
+// decodes from the start: lossy codecs (whose state after a seek never
+// quite equals the state reached from the start) and containers whose
+// positions cannot be trusted (raw MP3 and other unindexed streams). Reads
+// that go on where the last one ended never seek.
 //
 //   OutsideDecoder decoder(spec);                 // throws if it cannot decode
 //   std::vector<float> block(4096 * decoder.GetNumChannels());

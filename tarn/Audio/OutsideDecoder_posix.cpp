@@ -32,9 +32,8 @@ constexpr int kMaxChannels = 64;
 
 // Demuxers whose seek points carry true positions, so that a block's
 // reported start can be believed after a seek.
-bool DemuxerSeeksExactly(const char* name) {
+bool DemuxerSeeksExactly(const std::string& names) {
   static const char* const kExact[] = {"mov", "caf", "aiff", "avi", "wav", "w64", "matroska"};
-  const std::string names = name ? name : "";
   for (const char* exact : kExact)
     if (names.find(exact) != std::string::npos) return true;
   return false;
@@ -156,14 +155,26 @@ class FFmpegSource final : public DecodeSource {
   void DescribeStream(const AVStream& st, const AVCodec& codec) {
     const AVCodecDescriptor* desc = avcodec_descriptor_get(codec.id);
     const int props = desc ? desc->props : 0;
-    canSeek_ = DemuxerSeeksExactly(fmt_->iformat->name);
-    const bool memoryless = (props & (AV_CODEC_PROP_LOSSLESS | AV_CODEC_PROP_INTRA_ONLY)) != 0;
+    const std::string demuxer = fmt_->iformat->name ? fmt_->iformat->name : "";
+    // Lossless codecs and plain PCM (A-law and mu-law included) decode each
+    // packet alone. Lossy ones carry state from packet to packet (many are
+    // marked intra-only all the same), and some of it never settles after a
+    // seek (AAC's noise substitution draws from a generator that runs from
+    // the first frame): those decode from the start to stay sample-exact.
+    const bool pcm = codec.id >= AV_CODEC_ID_FIRST_AUDIO && codec.id < AV_CODEC_ID_ADPCM_IMA_QT;
+    const bool memoryless = pcm || (props & AV_CODEC_PROP_LOSSLESS) != 0;
+    canSeek_ = memoryless && DemuxerSeeksExactly(demuxer);
     preRoll_ = 0;
     if (!memoryless) {
       const std::int64_t frameSize = std::max(ctx_->frame_size, 1024);
       preRoll_ = std::max<std::int64_t>(st.codecpar->seek_preroll, 8 * frameSize);
     }
-    if (canSeek_ && memoryless && st.duration > 0 && st.duration != AV_NOPTS_VALUE)
+    // Only these containers' durations count the frames a decode gives
+    // (AVI's is estimated, CAF's includes the remainder frames).
+    const bool exactDuration = demuxer.find("mov") != std::string::npos ||
+                               demuxer.find("aiff") != std::string::npos || demuxer == "wav" ||
+                               demuxer == "w64";
+    if (exactDuration && memoryless && st.duration > 0 && st.duration != AV_NOPTS_VALUE)
       knownLength_ = av_rescale_q(st.duration, st.time_base, AVRational{1, rate_});
   }
 

@@ -38,8 +38,8 @@ struct Form {
 const Form kForms[] = {
     {"aifc-none.aifc", "AIFC", 2, 44100, true}, {"aifc-sowt.aifc", "AIFC", 2, 48000, true},
     {"aifc-fl32.aifc", "AIFC", 1, 44100, true}, {"aifc-ulaw.aifc", "AIFC", 2, 48000, true},
-    {"aifc-alaw.aifc", "AIFC", 1, 44100, true}, {"lame.mp3", "MP3 ", 2, 44100, false},
-    {"lame-mono.mp3", "MP3 ", 1, 48000, false}, {"aac.m4a", "M4A ", 2, 48000, false},
+    {"aifc-alaw.aifc", "AIFC", 1, 44100, true}, {"lame.mp3", "MPG3", 2, 44100, false},
+    {"lame-mono.mp3", "MPG3", 1, 48000, false}, {"aac.m4a", "M4A ", 2, 48000, false},
     {"aac-6ch.m4a", "M4A ", 6, 48000, false},   {"alac.m4a", "M4A ", 2, 44100, true},
     {"alac-6ch.m4a", "M4A ", 6, 96000, true},   {"alac.caf", "caff", 1, 44100, true},
     {"flac.caf", "caff", 2, 48000, true},       {"flac24.caf", "caff", 4, 96000, true},
