@@ -163,7 +163,10 @@ class FFmpegSource final : public DecodeSource {
     // the first frame): those decode from the start to stay sample-exact.
     const bool pcm = codec.id >= AV_CODEC_ID_FIRST_AUDIO && codec.id < AV_CODEC_ID_ADPCM_IMA_QT;
     const bool memoryless = pcm || (props & AV_CODEC_PROP_LOSSLESS) != 0;
-    canSeek_ = memoryless && DemuxerSeeksExactly(demuxer);
+    // FLAC in CAF: the CAF reader's positions after a seek miss the true
+    // ones, so that pair decodes from the start too.
+    const bool flacInCAF = demuxer == "caf" && codec.id == AV_CODEC_ID_FLAC;
+    canSeek_ = memoryless && DemuxerSeeksExactly(demuxer) && !flacInCAF;
     preRoll_ = 0;
     if (!memoryless) {
       const std::int64_t frameSize = std::max(ctx_->frame_size, 1024);

@@ -51,8 +51,13 @@ tone 6 48000 aac-6ch.m4a -c:a aac -b:a 256k
 tone 2 44100 alac.m4a -c:a alac
 tone 6 96000 alac-6ch.m4a -c:a alac -sample_fmt s32p
 tone 1 44100 alac.caf -c:a alac
-tone 2 48000 flac.caf -c:a flac
-tone 4 96000 flac24.caf -c:a flac -sample_fmt s32
+# FLAC in CAF by way of WAVE: ffmpeg's CAF reader refuses the FLAC CAF
+# its writer makes straight from the tone generator.
+tone 2 48000 flac.wav -c:a pcm_s16le
+ff -i flac.wav -c:a flac flac.caf
+tone 4 96000 flac24.wav -c:a pcm_s24le
+ff -i flac24.wav -c:a flac flac24.caf
+rm flac.wav flac24.wav
 tone 2 48000 flac.m4a -c:a flac -strict -2 -f mp4
 tone 4 96000 flac24.m4a -c:a flac -sample_fmt s32 -strict -2 -f mp4
 tone 2 48000 pcm16.mov -c:a pcm_s16le
