@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstring>
 #include <exception>
+#include <utility>
 
 #include "tarn/Audio/OutsideDecoderImpl.h"
 #include "tarn/Errors/Fail.h"
@@ -29,6 +30,12 @@ OutsideDecoder::OutsideDecoder(const FileSpecification& file) : file_(file) {
   } catch (...) {
     Fail("the file cannot be decoded");
   }
+}
+
+OutsideDecoder::OutsideDecoder(const FileSpecification& file,
+                               std::unique_ptr<odimpl::DecodeSource> source)
+    : file_(file), source_(std::move(source)) {
+  if (!source_) FailOSErr(kParamErr);
 }
 
 OutsideDecoder::~OutsideDecoder() = default;

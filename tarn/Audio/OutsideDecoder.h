@@ -49,6 +49,9 @@ class OutsideDecoder {
 
   // Opens the file and decodes its first audio block. Throws kDecodeErr.
   explicit OutsideDecoder(const FileSpecification& file);
+  // Over a block stream of one's own (OutsideDecoderImpl.h), such as a
+  // test's; `file` names it in errors.
+  OutsideDecoder(const FileSpecification& file, std::unique_ptr<odimpl::DecodeSource> source);
   OutsideDecoder(const OutsideDecoder&) = delete;
   OutsideDecoder& operator=(const OutsideDecoder&) = delete;
   ~OutsideDecoder();
