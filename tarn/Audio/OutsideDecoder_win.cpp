@@ -9,11 +9,14 @@
 #include <mfidl.h>
 #include <mfreadwrite.h>
 
+#include <chrono>
+#include <condition_variable>
 #include <cstdio>
 #include <cstring>
 #include <mutex>
 #include <stdexcept>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "tarn/Audio/OutsideDecoderImpl.h"
@@ -24,6 +27,10 @@ namespace {
 
 constexpr DWORD kAudio = static_cast<DWORD>(MF_SOURCE_READER_FIRST_AUDIO_STREAM);
 constexpr UINT32 kMaxChannels = 64;
+// How long opening a file and decoding its first block may take. Some
+// damaged files (chunk offsets beyond the end) leave the source reader
+// waiting for ever; such a file is refused and its reader abandoned.
+constexpr auto kOpenTimeout = std::chrono::seconds(15);
 
 void Check(HRESULT hr, const char* what) {
   if (SUCCEEDED(hr)) return;
@@ -171,9 +178,43 @@ class MFSource final : public DecodeSource {
 }  // namespace
 
 std::unique_ptr<DecodeSource> OpenDecodeSource(const FileSpecification& file) {
-  const UString path = file.GetFullPath();
-  return std::make_unique<MFSource>(
-      std::wstring(reinterpret_cast<const wchar_t*>(path.c_str()), path.size()));
+  const UString fullPath = file.GetFullPath();
+  std::wstring path(reinterpret_cast<const wchar_t*>(fullPath.c_str()), fullPath.size());
+  // Opened on a thread of its own, so that a reader that never answers
+  // cannot hang the caller.
+  struct Opening {
+    std::mutex lock;
+    std::condition_variable done;
+    bool finished = false;
+    bool abandoned = false;
+    std::unique_ptr<MFSource> source;
+    std::string error;
+  };
+  auto opening = std::make_shared<Opening>();
+  std::thread([opening, path = std::move(path)] {
+    std::unique_ptr<MFSource> source;
+    std::string error;
+    try {
+      source = std::make_unique<MFSource>(path);
+    } catch (const std::exception& e) {
+      error = e.what();
+    } catch (...) {
+      error = "the file cannot be decoded";
+    }
+    std::lock_guard<std::mutex> guard(opening->lock);
+    if (opening->abandoned) return;  // the source goes with this thread
+    opening->source = std::move(source);
+    opening->error = std::move(error);
+    opening->finished = true;
+    opening->done.notify_all();
+  }).detach();
+  std::unique_lock<std::mutex> guard(opening->lock);
+  if (!opening->done.wait_for(guard, kOpenTimeout, [&] { return opening->finished; })) {
+    opening->abandoned = true;
+    throw std::runtime_error("the converter does not answer for this file");
+  }
+  if (!opening->source) throw std::runtime_error(opening->error);
+  return std::move(opening->source);
 }
 
 }  // namespace tarn::odimpl
