@@ -6,8 +6,10 @@ set -euo pipefail
 packages=(
   build-essential g++ clang cmake ninja-build ccache pkg-config git
   libicu-dev uuid-dev nettle-dev
+  libavformat-dev libavcodec-dev libavutil-dev
   googletest libgtest-dev libgmock-dev libbenchmark-dev
   g++-mingw-w64-x86-64-posix wine64
+  gstreamer1.0-plugins-base gstreamer1.0-plugins-good gstreamer1.0-libav
   libsndfile1-dev sndfile-programs sox ffmpeg
   libboost-dev libmimalloc-dev libjemalloc-dev libgoogle-perftools-dev
   clang-format libclang-rt-14-dev mediainfo gcovr

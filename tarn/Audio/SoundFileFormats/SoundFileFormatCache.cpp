@@ -3,6 +3,7 @@
 
 #include <algorithm>
 
+#include "tarn/Audio/SoundFileFormats/ConverterSoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/RIFFType.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormat.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatFailImpl.h"
@@ -12,7 +13,9 @@
 
 namespace tarn {
 
-SoundFileFormatCache::SoundFileFormatCache() = default;
+// The outside converter serves converter-read types unless a test swaps it.
+SoundFileFormatCache::SoundFileFormatCache()
+    : converterFactory_(MakeConverterSoundFileFormat), converterProbe_(OutsideConverterCanOpen) {}
 SoundFileFormatCache::~SoundFileFormatCache() = default;
 
 SoundFileFormatCache& SoundFileFormatCache::Instance() {

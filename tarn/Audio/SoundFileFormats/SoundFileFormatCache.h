@@ -90,10 +90,10 @@ class SoundFileFormatCache {
   [[nodiscard]] static SoundFileFamily FamilyForType(std::uint32_t type) noexcept;
 
   // Replaces the converter factory (empty: none, which answers null);
-  // returns the previous one.
+  // returns the previous one. The default makes a ConverterSoundFileFormat.
   ConverterFormatFactory SetConverterFormatFactory(ConverterFormatFactory factory);
   // Replaces the converter probe (empty: none, which answers false);
-  // returns the previous one.
+  // returns the previous one. The default asks OutsideDecoder::CanDecode.
   ConverterProbe SetConverterProbe(ConverterProbe probe);
   // The converter probe: whether the outside converter can open `file`.
   // Never throws (a throwing probe answers false).
