@@ -398,6 +398,30 @@ TEST_F(ToolTest, TonesAndConversionsReadElsewhere) {
   EXPECT_FALSE(fs::exists(P("x.wav")));
 }
 
+TEST_F(ToolTest, ConvertedFormatsOpenThroughTheOutsideConverter) {
+  Need("ffmpeg", "ffmpeg");
+  Make(
+      "ffmpeg -loglevel error -f lavfi -i sine=frequency=440:duration=1:sample_rate=48000 "
+      "-ac 2 -c:a alac song.m4a && ffmpeg -loglevel error -i song.m4a song.mp3 && "
+      "ffmpeg -loglevel error -i song.m4a -f s16le song.raw && head -c 3000 /dev/urandom > "
+      "junk.mp3");
+  const std::string m4a = Tool("info --json song.m4a").out;
+  EXPECT_EQ(JsonValue(m4a, "container"), "converter");
+  EXPECT_EQ(JsonValue(m4a, "frames"), "48000");
+  EXPECT_EQ(JsonValue(m4a, "channels"), "2");
+  EXPECT_EQ(JsonValue(Tool("info --json song.mp3").out, "format"), "MP3 Audio");
+  // Lossless audio converts to the very samples ffmpeg decodes.
+  ASSERT_EQ(Tool("convert song.m4a song.wav --format s16").status, 0);
+  EXPECT_EQ(Output("sox song.wav -t s16 - | cmp - song.raw && echo same"), "same");
+  ASSERT_EQ(Tool("convert song.mp3 fromMp3").status, 0);  // no extension: WAVE
+  EXPECT_EQ(JsonValue(Tool("info --json fromMp3").out, "format"), "WAVE");
+  // Chunk tools need a chunk container; noise is refused naming the file.
+  EXPECT_EQ(Tool("chunks song.m4a").status, 1);
+  const Result junk = Tool("info junk.mp3");
+  EXPECT_EQ(junk.status, 1);
+  EXPECT_NE(junk.err.find("junk.mp3"), std::string::npos);
+}
+
 TEST_F(ToolTest, DemoRunsToTheEnd) {
   const Result r = Tool("demo demo-files");
   ASSERT_EQ(r.status, 0) << r.out << r.err;

@@ -40,8 +40,11 @@ int RunConvert(const Words& words) {
   if (format) target.format = ParseSampleFormat(*format);
   {
     FileScope scope(in);
-    const SoundFile source = OpenSoundFile(in);
-    target.container = TargetContainer(cl, out, source.container);
+    const SoundFile source = OpenSoundFile(in, true);
+    // A converted source is written as WAVE unless the name or --type says
+    // otherwise.
+    target.container = TargetContainer(
+        cl, out, source.container == Container::kConverter ? Container::kRIFF : source.container);
     if (!format) target.format = source.attributes.mSampleFormat;
     CheckStorable(target.container, target.format, source.attributes.mNumChannels);
   }

@@ -29,6 +29,7 @@ std::unique_ptr<tarn::SoundFileWriter> CreateWriter(const std::string& path,
   tarn::SoundFileWriter::Settings settings;
   switch (target.container) {
     case Container::kRIFF:
+    case Container::kConverter:
       settings.fileType = MakeRIFFType("WAVE");
       break;
     case Container::kWave64:
@@ -144,7 +145,7 @@ std::int64_t ConvertFile(const std::string& in, const std::string& out, AudioTar
   std::unique_ptr<tarn::SoundFileReader> reader;
   {
     FileScope scope(in);
-    reader = std::make_unique<tarn::SoundFileReader>(OpenSoundFile(in).format);
+    reader = std::make_unique<tarn::SoundFileReader>(OpenSoundFile(in, true).format);
   }
   const std::int64_t frames = reader->GetLengthInFrames().AsLongLong();
   const SampleFormat inFormat = reader->GetAttributes().mSampleFormat;

@@ -68,7 +68,7 @@ void WriteInfoJson(const std::string& path, SoundFile& file, const Facts& facts)
   JsonWriter json(line);
   json.BeginObject();
   json.Key("file").String(path);
-  json.Key("format").String(FormatName(file.container));
+  json.Key("format").String(file.formatName);
   json.Key("container").String(ContainerName(file.container));
   json.Key("channels").Int(a.mNumChannels);
   json.Key("rate").Number(a.mSampleRate);
@@ -111,9 +111,8 @@ void WriteInfoJson(const std::string& path, SoundFile& file, const Facts& facts)
 void PrintInfo(const std::string& path, SoundFile& file, const Facts& facts) {
   const tarn::SoundFileAttributes& a = file.attributes;
   std::printf("%s\n", path.c_str());
-  std::printf("  format          %s (%s container, %s-endian samples)\n",
-              FormatName(file.container), ContainerName(file.container),
-              a.mSamplesAreLSBFirst ? "little" : "big");
+  std::printf("  format          %s (%s container, %s-endian samples)\n", file.formatName.c_str(),
+              ContainerName(file.container), a.mSamplesAreLSBFirst ? "little" : "big");
   std::printf("  channels        %d\n", a.mNumChannels);
   std::printf("  rate            %g Hz\n", a.mSampleRate);
   std::printf("  sample format   %s (%d bytes per sample)\n", SampleFormatName(a.mSampleFormat),
@@ -144,7 +143,7 @@ int RunInfo(const Words& words) {
   const bool json = cl.Has("json");
   for (const std::string& path : cl.Positional()) {
     FileScope scope(path);
-    SoundFile file = OpenSoundFile(path);
+    SoundFile file = OpenSoundFile(path, true);
     const Facts facts = ReadFacts(file);
     if (json)
       WriteInfoJson(path, file, facts);

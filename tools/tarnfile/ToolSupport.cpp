@@ -145,6 +145,8 @@ const char* FormatName(Container c) noexcept {
       return "AIFF";
     case Container::kAIFC:
       return "AIFC";
+    case Container::kConverter:
+      return "converted";
     case Container::kUnknown:
       break;
   }
@@ -160,6 +162,8 @@ const char* ContainerName(Container c) noexcept {
     case Container::kAIFF:
     case Container::kAIFC:
       return "FORM";
+    case Container::kConverter:
+      return "converter";
     case Container::kUnknown:
       break;
   }
@@ -170,7 +174,7 @@ tarn::RIFFType SoundFile::AudioTag() const noexcept {
   return IsWAVE() ? MakeRIFFType("data") : MakeRIFFType("SSND");
 }
 
-SoundFile OpenSoundFile(const std::string& path) {
+SoundFile OpenSoundFile(const std::string& path, bool converterToo) {
   SoundFile file;
   file.spec = FileSpecification(SpecForPath(path).GetFullPath(), tarn::kMissingFileSpecFails);
   if (!file.spec.IsFile()) tarn::FailFSErr(-43, file.spec);
@@ -186,11 +190,19 @@ SoundFile OpenSoundFile(const std::string& path) {
     file.format = tarn::SoundFileFormatCache::Instance().GetFormat(file.spec, type);
     file.attributes = file.format->GetFileAttributes();
     file.frames = file.format->GetLengthInFrames().AsLongLong();
+    if (file.container == Container::kUnknown && converterToo &&
+        file.format->FormatRequiresExternalConversion())
+      file.container = Container::kConverter;
     if (file.container == Container::kUnknown)
       tarn::FailFormatError("tarnfile", tarn::kParamErr, file.spec);
+    tarn::UString name;
+    file.format->GetFormatName(name);
+    file.formatName = name.utf8_str();
+    if (file.formatName.empty()) file.formatName = FormatName(file.container);
   } catch (...) {
     if (file.container == Container::kUnknown)
-      std::fprintf(stderr, "tarnfile: %s: not a WAVE, Wave64, AIFF or AIFC file\n", path.c_str());
+      std::fprintf(stderr, "tarnfile: %s: not a WAVE, Wave64, AIFF or AIFC file%s\n", path.c_str(),
+                   converterToo ? ", nor one the outside converter reads" : "");
     throw;
   }
   return file;

@@ -78,14 +78,17 @@ class FileScope {
 [[nodiscard]] tarn::FileSpecification SpecForPath(const std::string& path);
 
 // The container of a sound file as its first bytes show it.
-enum class Container { kRIFF, kWave64, kAIFF, kAIFC, kUnknown };
+// kConverter: a file only the outside converter reads (MP3, M4A, CAF...).
+enum class Container { kRIFF, kWave64, kAIFF, kAIFC, kConverter, kUnknown };
 [[nodiscard]] Container SniffContainer(const tarn::FileSpecification& spec);
 [[nodiscard]] const char* FormatName(Container c) noexcept;     // "WAVE", "Wave64", "AIFF", "AIFC"
-[[nodiscard]] const char* ContainerName(Container c) noexcept;  // "RIFF", "Wave64", "FORM"
+[[nodiscard]] const char* ContainerName(Container c) noexcept;  // "RIFF", "Wave64", "FORM",
+                                                                // "converter"
 
 // An existing WAVE, Wave64, AIFF or AIFC file, opened through the format
-// cache and parsed. A missing file throws the file system's -43; any other
-// file throws the error of the reader its extension names (or the cache's
+// cache and parsed; with `converterToo`, also a file the outside converter
+// reads. A missing file throws the file system's -43; any other file throws
+// the error of the reader its extension names (or the cache's
 // unsupported-format error).
 struct SoundFile {
   tarn::FileSpecification spec;
@@ -93,6 +96,8 @@ struct SoundFile {
   std::shared_ptr<tarn::SoundFileFormat> format;
   tarn::SoundFileAttributes attributes;
   std::int64_t frames = 0;
+  // The file-type table's name of the format ("WAVE", "MP3 Audio", ...).
+  std::string formatName;
 
   [[nodiscard]] bool IsWAVE() const noexcept {
     return container == Container::kRIFF || container == Container::kWave64;
@@ -100,7 +105,7 @@ struct SoundFile {
   // The tag of the audio chunk: "data" or "SSND".
   [[nodiscard]] tarn::RIFFType AudioTag() const noexcept;
 };
-[[nodiscard]] SoundFile OpenSoundFile(const std::string& path);
+[[nodiscard]] SoundFile OpenSoundFile(const std::string& path, bool converterToo = false);
 // A chunk editor of the file with its container's handler, listed.
 [[nodiscard]] std::unique_ptr<tarn::RIFFFileEditor> MakeChunkEditor(const SoundFile& file);
 // MD5 of the audio payload (the frames only, from the audio offset), as 32
