@@ -195,10 +195,14 @@ SoundFile OpenSoundFile(const std::string& path, bool converterToo) {
       file.container = Container::kConverter;
     if (file.container == Container::kUnknown)
       tarn::FailFormatError("tarnfile", tarn::kParamErr, file.spec);
-    tarn::UString name;
-    file.format->GetFormatName(name);
-    file.formatName = name.utf8_str();
-    if (file.formatName.empty()) file.formatName = FormatName(file.container);
+    // The container's own name where there is one; the file-type table's
+    // for a converted file.
+    file.formatName = FormatName(file.container);
+    if (file.container == Container::kConverter) {
+      tarn::UString name;
+      file.format->GetFormatName(name);
+      if (!name.empty()) file.formatName = name.utf8_str();
+    }
   } catch (...) {
     if (file.container == Container::kUnknown)
       std::fprintf(stderr, "tarnfile: %s: not a WAVE, Wave64, AIFF or AIFC file%s\n", path.c_str(),
