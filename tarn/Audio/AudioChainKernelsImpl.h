@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdint>
 
 namespace tarn::chainimpl {
 
@@ -20,6 +21,27 @@ inline constexpr std::size_t kReadAheadBytes = std::size_t{1} << 20;
 // least kBlockFrames, otherwise about kReadAheadBytes of them.
 [[nodiscard]] inline std::size_t ReadBlockFrames(std::size_t frameBytes) noexcept {
   return std::max(kBlockFrames, kReadAheadBytes / std::max<std::size_t>(frameBytes, 1));
+}
+
+// Moves frames [start, start + frames) through a scratch buffer in blocks of
+// at most `block` frames: `read(at, count)` fills the scratch from the source
+// and returns the frames it got; `use(done, got)` passes those on, `done`
+// being the frames already used. Stops after the first short read; returns
+// the frames used.
+template <typename Read, typename Use>
+std::int64_t ReadInBlocks(std::int64_t start, std::int64_t frames, std::size_t block, Read&& read,
+                          Use&& use) {
+  std::int64_t done = 0;
+  while (done < frames) {
+    const std::int64_t want =
+        std::min<std::int64_t>(frames - done, static_cast<std::int64_t>(block));
+    const std::int64_t got = read(start + done, want);
+    if (got <= 0) break;
+    use(static_cast<std::size_t>(done), static_cast<std::size_t>(got));
+    done += got;
+    if (got < want) break;
+  }
+  return done;
 }
 
 // Splits `frames` interleaved frames of `channels` samples of

@@ -63,18 +63,12 @@ SampleCount ConvertingReader::ReadFrames(void* const* channels, SampleCount star
   const std::size_t block =
       chainimpl::ReadBlockFrames(static_cast<std::size_t>(sourceBytes_) * scratchChannels_.size());
   Reserve(block);
-  std::int64_t done = 0;
-  while (done < frames.AsLongLong()) {
-    const std::int64_t want =
-        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(block));
-    const std::int64_t got =
-        source_->OutOfOrderRead(scratchChannels_.data(), start + done, want).AsLongLong();
-    if (got <= 0) break;
-    ConvertInto(channels, static_cast<std::size_t>(done), static_cast<std::size_t>(got));
-    done += got;
-    if (got < want) break;
-  }
-  return done;
+  return chainimpl::ReadInBlocks(
+      start.AsLongLong(), frames.AsLongLong(), block,
+      [this](std::int64_t at, std::int64_t count) {
+        return source_->OutOfOrderRead(scratchChannels_.data(), at, count).AsLongLong();
+      },
+      [this, channels](std::size_t done, std::size_t got) { ConvertInto(channels, done, got); });
 }
 
 void ConvertingReader::ReadFramesAsync(ChannelPointers channels, SampleCount start,

@@ -31,19 +31,14 @@ SampleCount DeinterleavingReader::ReadFrames(void* const* channels, SampleCount 
   const std::size_t frameBytes = static_cast<std::size_t>(bytesPerSample_) * numChannels;
   const std::size_t block = chainimpl::ReadBlockFrames(frameBytes);
   scratch_.resize(std::max(scratch_.size(), block * frameBytes));
-  std::int64_t done = 0;
-  while (done < frames.AsLongLong()) {
-    const std::int64_t want =
-        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(block));
-    const std::int64_t got =
-        source_->OutOfOrderRead(scratch_.data(), start + done, want).AsLongLong();
-    if (got <= 0) break;
-    chainimpl::Deinterleave(scratch_.data(), channels, numChannels, bytesPerSample_,
-                            static_cast<std::size_t>(got), static_cast<std::size_t>(done));
-    done += got;
-    if (got < want) break;
-  }
-  return done;
+  return chainimpl::ReadInBlocks(
+      start.AsLongLong(), frames.AsLongLong(), block,
+      [this](std::int64_t at, std::int64_t count) {
+        return source_->OutOfOrderRead(scratch_.data(), at, count).AsLongLong();
+      },
+      [&](std::size_t done, std::size_t got) {
+        chainimpl::Deinterleave(scratch_.data(), channels, numChannels, bytesPerSample_, got, done);
+      });
 }
 
 void DeinterleavingReader::ReadFramesAsync(ChannelPointers channels, SampleCount start,

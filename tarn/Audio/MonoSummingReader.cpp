@@ -40,19 +40,14 @@ SampleCount MonoSummingReader::ReadFrames(void* const* channels, SampleCount sta
       chainimpl::ReadBlockFrames(sizeof(float) * static_cast<std::size_t>(numChannels));
   Reserve(block);
   auto* out = static_cast<float*>(channels[0]);
-  std::int64_t done = 0;
-  while (done < frames.AsLongLong()) {
-    const std::int64_t want =
-        std::min<std::int64_t>(frames.AsLongLong() - done, static_cast<std::int64_t>(block));
-    const std::int64_t got =
-        source_->OutOfOrderRead(scratchChannels_.data(), start + done, want).AsLongLong();
-    if (got <= 0) break;
-    chainimpl::SumChannels(scratchChannels_.data(), numChannels, 0, out + done,
-                           static_cast<std::size_t>(got));
-    done += got;
-    if (got < want) break;
-  }
-  return done;
+  return chainimpl::ReadInBlocks(
+      start.AsLongLong(), frames.AsLongLong(), block,
+      [this](std::int64_t at, std::int64_t count) {
+        return source_->OutOfOrderRead(scratchChannels_.data(), at, count).AsLongLong();
+      },
+      [&](std::size_t done, std::size_t got) {
+        chainimpl::SumChannels(scratchChannels_.data(), numChannels, 0, out + done, got);
+      });
 }
 
 void MonoSummingReader::ReadFramesAsync(ChannelPointers channels, SampleCount start,

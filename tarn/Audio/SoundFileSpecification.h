@@ -52,9 +52,9 @@ class SoundFileSpecification {
   [[nodiscard]] static UString GetChannelSuffix(const HostChannelOrder& order, int index);
   // Splits a channel file's name ("Take.Ls.wav") into base name ("Take"),
   // suffix (".Ls": from the last dot before the extension) and extension
-  // ("wav", without its dot; empty when the name has none). Returns false, leaving the outputs alone, when the
-  // part before the extension ends in no known suffix (the host's or a
-  // channel number) or nothing would remain of the base name.
+  // ("wav", without its dot; empty when the name has none). Returns false, leaving the outputs
+  // alone, when the part before the extension ends in no known suffix (the host's or a channel
+  // number) or nothing would remain of the base name.
   static bool SplitChannelFileName(const UString& name, UString& baseName, UString& suffix,
                                    UString& extension);
 

@@ -74,7 +74,7 @@ class FileScope {
 };
 [[nodiscard]] const std::string& CurrentFile() noexcept;
 
-// The absolute specification of a path given on the command line.
+// The FileSpecification of a path given on the command line, made absolute.
 [[nodiscard]] tarn::FileSpecification SpecForPath(const std::string& path);
 
 // The container of a sound file as its first bytes show it.
