@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "tarn/Audio/AudioChainKernelsImpl.h"
 #include "tarn/Audio/OutsideDecoderImpl.h"
 
 extern "C" {
@@ -39,6 +40,8 @@ bool DemuxerSeeksExactly(const std::string& names) {
   return false;
 }
 
+// Interleaved float samples from a decoder format the library has no
+// sample format for (double, 64-bit integer).
 template <class Src, class Dst, class Convert>
 void Interleave(const AVFrame& frame, bool planar, int channels, std::byte* out, Convert convert) {
   const int n = frame.nb_samples;
@@ -261,30 +264,21 @@ class FFmpegSource final : public DecodeSource {
     const bool planar = av_sample_fmt_is_planar(format) != 0;
     buffer_.resize(static_cast<std::size_t>(f.nb_samples) * static_cast<std::size_t>(channels) *
                    static_cast<std::size_t>(GetBytesPerSample(format_)));
+    if (buffer_.empty()) return;
     std::byte* out = buffer_.data();
-    const auto same = [](auto x) { return x; };
-    switch (packed) {
-      case AV_SAMPLE_FMT_U8:
-        Interleave<std::uint8_t, std::uint8_t>(f, planar, channels, out, same);
-        break;
-      case AV_SAMPLE_FMT_S16:
-        Interleave<std::int16_t, std::int16_t>(f, planar, channels, out, same);
-        break;
-      case AV_SAMPLE_FMT_S32:
-        Interleave<std::int32_t, std::int32_t>(f, planar, channels, out, same);
-        break;
-      case AV_SAMPLE_FMT_FLT:
-        Interleave<float, float>(f, planar, channels, out, same);
-        break;
-      case AV_SAMPLE_FMT_DBL:
-        Interleave<double, float>(f, planar, channels, out,
-                                  [](double x) { return static_cast<float>(x); });
-        break;
-      default:
-        Interleave<std::int64_t, float>(f, planar, channels, out, [](std::int64_t x) {
-          return static_cast<float>(x) * (1.0f / 9223372036854775808.0f);
-        });
-        break;
+    if (packed == AV_SAMPLE_FMT_DBL) {
+      Interleave<double, float>(f, planar, channels, out,
+                                [](double x) { return static_cast<float>(x); });
+    } else if (packed == AV_SAMPLE_FMT_S64) {
+      Interleave<std::int64_t, float>(f, planar, channels, out, [](std::int64_t x) {
+        return static_cast<float>(x) * (1.0f / 9223372036854775808.0f);
+      });
+    } else if (!planar) {
+      // The decoder's own samples, already interleaved.
+      std::memcpy(out, f.extended_data[0], buffer_.size());
+    } else {
+      chainimpl::Interleave(reinterpret_cast<const void* const*>(f.extended_data), 0, out, channels,
+                            GetBytesPerSample(format_), static_cast<std::size_t>(f.nb_samples));
     }
   }
 
