@@ -11,6 +11,6 @@ cmake --build "$build/example-cmake" >/dev/null
 "$build/example-cmake/tarn_example" >/dev/null
 PKG_CONFIG_PATH="$prefix/lib/pkgconfig" \
   c++ examples/example.cpp -o "$build/example-pkgconfig" \
-  $(PKG_CONFIG_PATH="$prefix/lib/pkgconfig" pkg-config --cflags --libs --static tarncore)
+  $(PKG_CONFIG_PATH="$prefix/lib/pkgconfig" pkg-config --cflags --libs tarncore)
 "$build/example-pkgconfig" >/dev/null
 echo "install check: find_package and pkg-config builds of the example run"
