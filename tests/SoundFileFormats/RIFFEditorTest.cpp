@@ -139,6 +139,16 @@ TEST(RIFFEditorListing, LyingFilesStopOrStretchAsTheyShould) {
        {},
        {{kData, 0, 9}},
        true},
+      {"a second data longer than the file ends the walk",
+       Container::kRIFF,
+       {{kData, Pattern(2)}, {kData, Pattern(4), 1000}},
+       {},
+       {{kData, 0, 2}}},
+      {"SSND in a RIFF file is metadata",
+       Container::kRIFF,
+       {{kFmt, Pattern(2)}, {kSsnd, Pattern(4), 1000}},
+       {},
+       {{kFmt, 0, 2}}},
       {"metadata longer than the file ends the walk",
        Container::kRIFF,
        {{kFmt, Pattern(2)}, {kBext, Pattern(4), 1000}, {kData, Pattern(2)}},
@@ -229,16 +239,26 @@ TEST(RIFFEditorEdits, RandomEditSequencesMatchTheModel) {
   std::mt19937 rng(20261123);
   const RIFFType pool[] = {kFmt, kBext, kList, kQzma};
   const auto pick = [&](int n) { return static_cast<int>(rng() % static_cast<unsigned>(n)); };
-  const auto chunksOf = [&](std::vector<ChunkSpec>& chunks, int most) {
-    for (int i = pick(most + 1); i > 0; --i)
-      chunks.push_back({pool[pick(4)], Pattern(static_cast<std::size_t>(pick(20)), 30)});
+  // After the audio a chunk may also carry the audio tag again, or (where
+  // the container can name it) the other container's audio tag: both are
+  // metadata there, moved like any other.
+  const auto chunksOf = [&](std::vector<ChunkSpec>& chunks, int most, Container c,
+                            bool afterAudio) {
+    const RIFFType also[] = {AudioTagOf(c), IsWave64(c)             ? kData
+                                            : c == Container::kFORM ? kData
+                                                                    : kSsnd};
+    for (int i = pick(most + 1); i > 0; --i) {
+      const int which = pick(afterAudio ? 6 : 4);
+      chunks.push_back({which < 4 ? pool[which] : also[which - 4],
+                        Pattern(static_cast<std::size_t>(pick(20)), 30)});
+    }
   };
   for (Container c : kContainers) {
     for (int round = 0; round < 100; ++round) {
       std::vector<ChunkSpec> chunks;
-      chunksOf(chunks, 3);
+      chunksOf(chunks, 3, c, false);
       chunks.push_back({AudioTagOf(c), Pattern(1 + static_cast<std::size_t>(pick(40)), 99)});
-      chunksOf(chunks, 3);
+      chunksOf(chunks, 3, c, true);
       WriteFile(path, FileImage(chunks, c));
       ChunkModel model(ReadFile(path), c);
       const Bytes audio = model.Audio();

@@ -192,19 +192,24 @@ void RIFFFileEditor::ReadChunkLocationsExt(ChunkList& list, StopParsingTester* t
   stream_->MoveTo(0);
   (void)ReadRIFFChunk();
   const std::int64_t fileLength = stream_->Size();
+  // Only the container's first audio chunk holds the audio; a later one of
+  // that tag, or the other container's audio tag, is metadata like any other.
+  const RIFFType audioTag = endian_ == kRIFFBigEndian ? kSoundTag : kDataTag;
+  bool audioListed = false;
   try {
     for (;;) {
       const std::int64_t headerStart = stream_->Position();
       const ChunkHeader header = ReadChunkHeader();
       const std::int64_t payloadStart = stream_->Position();
-      const bool isAudio = header.tag == kSoundTag || header.tag == kDataTag;
+      const bool isAudio = !audioListed && header.tag == audioTag;
+      audioListed = audioListed || isAudio;
       std::int64_t length = header.padded;
       if (length > fileLength) {
         if (!isAudio) break;  // a lying metadata size ends the walk
         audioRunsToEnd_ = true;
         length = fileLength - payloadStart;
       }
-      if (length == 0 && header.tag == kSoundTag) length = fileLength - payloadStart;
+      if (length == 0 && isAudio && header.tag == kSoundTag) length = fileLength - payloadStart;
       list.emplace_back(ChunkInfo{header.tag, header.uuid, headerStart, length}, kKeepSegment);
       if (header.tag == kNullTag || (tester != nullptr && tester->ShouldStop(header.tag)) ||
           payloadStart + length >= fileLength)
@@ -317,7 +322,7 @@ void RIFFFileEditor::DetermineSegmentActions(const ChunkData* chunk, RIFFType au
   bool seenAudio = false;
   for (auto& [info, action] : chunks_) {
     if (action != kJunkSegment) action = kKeepSegment;
-    if (info.tag == audioTag) {
+    if (info.tag == audioTag && !seenAudio) {
       seenAudio = true;
       if (audioRunsToEnd_) action = kFixAudioHeader;
     } else if (chunk && info.tag == chunk->tag) {
