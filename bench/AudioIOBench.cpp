@@ -8,7 +8,9 @@
 //              would do.
 //   ReadCold   the same with the file's pages dropped from the cache
 //              (posix_fadvise DONTNEED) before each run: unbuffered against
-//              cached reads of ours.
+//              cached reads of ours; and below it the bare disk's two
+//              ways (read(2) in 1 MiB requests, cached and O_DIRECT), the
+//              floor the platform sets under that ratio.
 //   Write      the same frames from per-channel float into a new 24-bit
 //              file: ours through SoundFileWriter (cached and unbuffered),
 //              libsndfile interleaving first and then sf_writef_float.
@@ -36,6 +38,8 @@
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <new>
+#include <stdexcept>
 #include <string>
 #include <thread>
 #include <vector>
@@ -94,6 +98,22 @@ void WarmCache(const std::string& path) {
   std::vector<char> buffer(1 << 20);
   while (::read(fd, buffer.data(), buffer.size()) > 0) {
   }
+  ::close(fd);
+}
+
+// Reads the whole file in 1 MiB requests with nothing else to do: through
+// the system cache, or (direct) without it into an aligned buffer. On a cold
+// cache this is what the disk itself gives each way, the floor under the
+// chain's cold reads.
+void ReadRaw(const std::string& path, bool direct) {
+  const int fd = ::open(path.c_str(), O_RDONLY | (direct ? O_DIRECT : 0));
+  if (fd < 0) throw std::runtime_error("cannot open " + path);
+  constexpr std::size_t kRequest = 1 << 20;
+  void* buffer = nullptr;
+  if (::posix_memalign(&buffer, 4096, kRequest) != 0) throw std::bad_alloc();
+  while (::read(fd, buffer, kRequest) > 0) {
+  }
+  std::free(buffer);
   ::close(fd);
 }
 
@@ -288,6 +308,8 @@ int main() {
     const auto drop = [&] { DropCache(ours); };
     const double coldCached = TimeMedian(3, drop, [&] { ReadOurs(ours, kCachedCaching); });
     const double coldUnbuffered = TimeMedian(3, drop, [&] { ReadOurs(ours, kUnbufferedCaching); });
+    const double rawCached = TimeMedian(3, drop, [&] { ReadRaw(ours, false); });
+    const double rawDirect = TimeMedian(3, drop, [&] { ReadRaw(ours, true); });
 
     const double mib = static_cast<double>(megabytes);
     std::printf("\n%-28s %10s %10s\n", "case", "seconds", "MiB/s");
@@ -302,12 +324,17 @@ int main() {
     row("read libsndfile", readTheirs);
     row("cold read ours cached", coldCached);
     row("cold read ours unbuffered", coldUnbuffered);
+    row("cold read(2) cached", rawCached);
+    row("cold read(2) O_DIRECT", rawDirect);
     std::printf("\n");
     Report("Write", "libsndfile", writeOurs, writeTheirs, "s");
     Report("WriteUnbuffered", "libsndfile", writeUnbuffered, writeTheirs, "s");
     Report("Read", "libsndfile", readOurs, readTheirs, "s");
     Report("ReadUnbuffered", "libsndfile", readUnbufferedWarm, readTheirs, "s");
     Report("ReadCold", "cached_cold", coldUnbuffered, coldCached, "s");
+    // The same comparison for the bare disk: what the platform allows the
+    // line above.
+    Report("ReadColdDisk", "cached_cold_disk", rawDirect, rawCached, "s");
 
     // Completion latency of a 4 KiB read from the page cache.
     WarmCache(ours);
