@@ -1,7 +1,12 @@
 #include "tarn/Audio/AudioInFile.h"
 
 #include <algorithm>
+#include <condition_variable>
+#include <cstring>
 #include <limits>
+#include <mutex>
+#include <new>
+#include <vector>
 
 #include "tarn/Audio/AudioOutFile.h"
 #include "tarn/Errors/Fail.h"
@@ -20,7 +25,23 @@ AudioFormat CheckedFormat(const DSPSoundBiteSpec& bite, std::optional<SampleForm
   return {format, a.mNumChannels, a.mSampleRate};
 }
 
+// Reads ahead are no larger than this; a longer request takes the rest from
+// the file.
+constexpr std::int64_t kMaxPrefetchBytes = std::int64_t{16} << 20;
+
 }  // namespace
+
+// One block read ahead. The reader thread's completion owns a reference, so
+// a forgotten prefetch finishes into its own buffer.
+struct AudioInFile::Prefetch {
+  std::mutex mutex;
+  std::condition_variable finished;
+  bool inFlight = false;  // guarded by mutex
+  bool valid = false;     // a finished read of [position, position + result.bytes)
+  std::int64_t position = 0;
+  FileResult result{};
+  std::vector<std::byte> buffer;
+};
 
 AudioInFile::AudioInFile(const DSPSoundBiteSpec& bite, const FileLength& length,
                          PlatformFileOptions options)
@@ -40,9 +61,78 @@ AudioInFile::AudioInFile(const DSPSoundBiteSpec& bite, const FileLength& length,
   if (end > maxFrames) FailFSErr(kParamErr, bite.mFile);
   firstByte_ = GetHeaderSize() + start * frameSize;
   dataEnd_ = GetHeaderSize() + end * frameSize;
+  nextSequential_ = firstByte_;
 }
 
-AudioInFile::~AudioInFile() = default;
+AudioInFile::~AudioInFile() { SettlePrefetch(); }
+
+void AudioInFile::SettlePrefetch() noexcept {
+  if (!prefetch_) return;
+  std::unique_lock lock(prefetch_->mutex);
+  if (!prefetch_->inFlight) return;
+  if (PlatformAudioFile::IsReaderThread()) {
+    lock.unlock();
+    prefetch_.reset();
+    return;
+  }
+  prefetch_->finished.wait(lock, [&] { return !prefetch_->inFlight; });
+}
+
+FileResult AudioInFile::ReadBytes(PlatformAudioFile& file, void* buffer, std::int64_t position,
+                                  std::int64_t count) {
+  SettlePrefetch();
+  FileResult result{kFileOK, 0};
+  if (prefetch_ && prefetch_->valid && prefetch_->position == position &&
+      prefetch_->result.status == kFileOK) {
+    prefetch_->valid = false;
+    // The file may have been cut since the block was read.
+    const std::int64_t served = std::min(count, prefetch_->result.bytes);
+    const FileResult size = file.GetSize();
+    if (size.status == kFileOK && size.bytes >= position + served) {
+      std::memcpy(buffer, prefetch_->buffer.data(), static_cast<std::size_t>(served));
+      result.bytes = served;
+    }
+  }
+  if (prefetch_) prefetch_->valid = false;
+  if (result.bytes < count) {
+    const FileResult rest = file.SyncRead(static_cast<std::byte*>(buffer) + result.bytes,
+                                          static_cast<std::uint64_t>(count - result.bytes),
+                                          static_cast<std::uint64_t>(position + result.bytes));
+    result = {rest.status, result.bytes + rest.bytes};
+  }
+  const bool forward = position == nextSequential_;
+  nextSequential_ = position + result.bytes;
+  const std::int64_t next = position + count;
+  const std::int64_t ahead = std::min({count, dataEnd_ - next, kMaxPrefetchBytes});
+  if (!forward || result.status != kFileOK || ahead <= 0 || !file.NeedsAlignment() ||
+      PlatformAudioFile::IsReaderThread())
+    return result;
+  if (!prefetch_) prefetch_ = std::make_shared<Prefetch>();
+  Prefetch& p = *prefetch_;
+  if (p.buffer.size() < static_cast<std::size_t>(ahead))
+    p.buffer.resize(static_cast<std::size_t>(ahead));
+  p.position = next;
+  {
+    std::lock_guard lock(p.mutex);
+    p.inFlight = true;
+  }
+  try {
+    file.AsyncRead(p.buffer.data(), static_cast<std::uint64_t>(next),
+                   static_cast<std::uint64_t>(ahead),
+                   [state = prefetch_](std::int32_t status, std::int32_t bytes) {
+                     std::lock_guard lock(state->mutex);
+                     state->result = {static_cast<FileStatus>(status), bytes};
+                     state->valid = true;
+                     state->inFlight = false;
+                     state->finished.notify_all();
+                   });
+  } catch (const std::bad_alloc&) {
+    // Reading ahead is optional: the next request reads the file itself.
+    std::lock_guard lock(p.mutex);
+    p.inFlight = false;
+  }
+  return result;
+}
 
 SampleCount AudioInFile::GetLengthInFrames() const {
   return (dataEnd_ - firstByte_) / GetFrameSize();
@@ -74,8 +164,7 @@ SampleCount AudioInFile::Read(void* buffer, SampleCount frames) {
   const std::int64_t left = (dataEnd_ - firstByte_ - readPosition_) / frameSize;
   const std::int64_t count = std::clamp<std::int64_t>(frames.AsLongLong(), 0, left);
   if (count == 0) return 0;
-  const FileResult result = file.SyncRead(buffer, static_cast<std::uint64_t>(count * frameSize),
-                                          static_cast<std::uint64_t>(firstByte_ + readPosition_));
+  const FileResult result = ReadBytes(file, buffer, firstByte_ + readPosition_, count * frameSize);
   const std::int64_t whole = result.bytes / frameSize * frameSize;
   if (ShouldSwapBuffer()) ByteSwapBuffer(buffer, whole);
   if (result.status == kFileEOFErr) {
@@ -92,8 +181,7 @@ SampleCount AudioInFile::OutOfOrderRead(void* buffer, SampleCount start, SampleC
   std::int64_t position = 0, count = 0;
   PreflightReadRequest(start, frames, position, count);
   if (count == 0) return 0;
-  const FileResult result = file.SyncRead(buffer, static_cast<std::uint64_t>(count),
-                                          static_cast<std::uint64_t>(firstByte_ + position));
+  const FileResult result = ReadBytes(file, buffer, firstByte_ + position, count);
   if (ShouldSwapBuffer()) ByteSwapBuffer(buffer, result.bytes / GetFrameSize() * GetFrameSize());
   FailOSErr(result.status);
   return result.bytes / GetFrameSize();
@@ -104,6 +192,7 @@ void AudioInFile::OutOfOrderReadAsync(void* buffer, SampleCount start, SampleCou
   PlatformAudioFile& file = OpenFile();
   std::int64_t position = 0, count = 0;
   PreflightReadRequest(start, frames, position, count);
+  SettlePrefetch();
   file.AsyncRead(
       buffer, static_cast<std::uint64_t>(firstByte_ + position), static_cast<std::uint64_t>(count),
       [this, buffer, completion = std::move(completion)](std::int32_t status, std::int32_t bytes) {
@@ -125,6 +214,7 @@ void AudioInFile::SetByteSwappingBasedOnDesriedOutputByteOrder(bool fileIsLSBFir
 }
 
 SampleCount AudioInFile::CheckEndPosition() {
+  SettlePrefetch();
   const FileResult size = OpenFile().GetSize();
   FailOSErr(size.status);
   if (size.bytes < dataEnd_) {

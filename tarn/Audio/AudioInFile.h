@@ -8,6 +8,15 @@
 // end or past the audio the file held when it was made (FileLength), and a
 // file that turns out shorter (cut while open) gives short reads.
 //
+// Read-ahead: on a file read without the system cache (see
+// PlatformFileDriver), a Read or OutOfOrderRead that starts where the
+// previous one ended queues a read of the same size that follows it on the
+// reader thread, and a next request starting there is served from it while
+// the disk already works on the one after. A prefetched block is used only
+// for the same byte range and only as far as the file still reaches; every
+// other request reads the file directly, and a request that touches the
+// file (or the destructor) first waits for a queued prefetch.
+//
 //   AudioInFile in(bite, FileLength{frames});
 //   std::vector<std::byte> block(4096 * in.GetBytesPerFrame());
 //   while (SampleCount got = in.Read(block.data(), 4096)) { ... }
@@ -15,7 +24,8 @@
 //
 // Threads: one thread at a time; an asynchronous read's completion (and the
 // performance monitor) runs on "PlatformAudioFile Reader Thread", and the
-// reader must outlive it. Failures: the file layer's statuses through
+// reader must outlive it. Reads made inside such a completion never read
+// ahead. Failures: the file layer's statuses through
 // FailOSErr; Read alone absorbs the end of the file (-39).
 
 #include <cstdint>
@@ -86,9 +96,20 @@ class AudioInFile : public AudioFile, public AsyncAudioReader {
   }
 
  private:
-  std::int64_t firstByte_;         // file offset of the stretch's frame 0
-  std::int64_t dataEnd_;           // file offset after the last readable byte; >= firstByte_
-  std::int64_t readPosition_ = 0;  // bytes from firstByte_; in [0, dataEnd_ - firstByte_]
+  struct Prefetch;
+  // Reads `count` bytes at file offset `position`, from the prefetched block
+  // when it matches, and queues the next prefetch when reads run forward.
+  FileResult ReadBytes(PlatformAudioFile& file, void* buffer, std::int64_t position,
+                       std::int64_t count);
+  // Waits until no prefetch is in flight (on the reader thread, forgets it:
+  // it runs after the current job there).
+  void SettlePrefetch() noexcept;
+
+  std::shared_ptr<Prefetch> prefetch_;  // null until the first read-ahead
+  std::int64_t nextSequential_ = 0;     // file offset after the last read
+  std::int64_t firstByte_;              // file offset of the stretch's frame 0
+  std::int64_t dataEnd_;                // file offset after the last readable byte; >= firstByte_
+  std::int64_t readPosition_ = 0;       // bytes from firstByte_; in [0, dataEnd_ - firstByte_]
   HostChannelOrder channelOrder_;
   std::shared_ptr<AudioReadPerformanceMonitor> monitor_;
 };

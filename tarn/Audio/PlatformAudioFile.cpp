@@ -221,6 +221,10 @@ void PlatformAudioFile::AsyncRead(void* buffer, std::uint64_t position, std::uin
   });
 }
 
+bool PlatformAudioFile::IsReaderThread() {
+  return Singleton<ReaderThread>::Instance().Get().IsCurrent();
+}
+
 std::uint64_t PlatformAudioFile::GetPosition() const noexcept { return impl_->position_; }
 
 void PlatformAudioFile::SetPosition(std::uint64_t position) noexcept {

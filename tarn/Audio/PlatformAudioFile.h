@@ -70,6 +70,9 @@ class PlatformAudioFile {
   // returns at once; `completion` runs there afterwards. `buffer` must stay
   // valid until then. Reads of more than 2^31 - 1 bytes complete with -50.
   void AsyncRead(void* buffer, std::uint64_t position, std::uint64_t count, Completion completion);
+  // True on the reader thread (inside a completion), where waiting for a
+  // queued read would wait forever.
+  [[nodiscard]] static bool IsReaderThread();
 
   [[nodiscard]] std::uint64_t GetPosition() const noexcept;
   // Stores the position only; the system's file pointer is not touched.
