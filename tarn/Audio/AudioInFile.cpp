@@ -36,11 +36,14 @@ constexpr std::int64_t kMaxPrefetchBytes = std::int64_t{16} << 20;
 struct AudioInFile::Prefetch {
   std::mutex mutex;
   std::condition_variable finished;
-  bool inFlight = false;  // guarded by mutex
-  bool valid = false;     // a finished read of [position, position + result.bytes)
-  std::int64_t position = 0;
+  bool inFlight = false;      // guarded by mutex
+  bool valid = false;         // a finished read of [position, position + result.bytes)
+  std::int64_t position = 0;  // a multiple of the block size
   FileResult result{};
+  // Whole blocks go straight from the disk to `data`, the first block
+  // boundary in `buffer`.
   std::vector<std::byte> buffer;
+  std::byte* data = nullptr;
 };
 
 AudioInFile::AudioInFile(const DSPSoundBiteSpec& bite, const FileLength& length,
@@ -82,14 +85,15 @@ FileResult AudioInFile::ReadBytes(PlatformAudioFile& file, void* buffer, std::in
                                   std::int64_t count) {
   SettlePrefetch();
   FileResult result{kFileOK, 0};
-  if (prefetch_ && prefetch_->valid && prefetch_->position == position &&
-      prefetch_->result.status == kFileOK) {
-    prefetch_->valid = false;
+  if (prefetch_ && prefetch_->valid &&
+      (prefetch_->result.status == kFileOK || prefetch_->result.status == kFileEOFErr) &&
+      position >= prefetch_->position && position < prefetch_->position + prefetch_->result.bytes) {
+    const std::int64_t skip = position - prefetch_->position;
+    const std::int64_t served = std::min(count, prefetch_->result.bytes - skip);
     // The file may have been cut since the block was read.
-    const std::int64_t served = std::min(count, prefetch_->result.bytes);
     const FileResult size = file.GetSize();
     if (size.status == kFileOK && size.bytes >= position + served) {
-      std::memcpy(buffer, prefetch_->buffer.data(), static_cast<std::size_t>(served));
+      std::memcpy(buffer, prefetch_->data + skip, static_cast<std::size_t>(served));
       result.bytes = served;
     }
   }
@@ -109,16 +113,23 @@ FileResult AudioInFile::ReadBytes(PlatformAudioFile& file, void* buffer, std::in
     return result;
   if (!prefetch_) prefetch_ = std::make_shared<Prefetch>();
   Prefetch& p = *prefetch_;
-  if (p.buffer.size() < static_cast<std::size_t>(ahead))
-    p.buffer.resize(static_cast<std::size_t>(ahead));
-  p.position = next;
+  constexpr std::int64_t kBlock = PlatformAudioFile::kBlockSize;
+  const std::int64_t alignedStart = next / kBlock * kBlock;
+  const std::int64_t span = (next + ahead + kBlock - 1) / kBlock * kBlock - alignedStart;
+  if (p.buffer.size() < static_cast<std::size_t>(span + kBlock)) {
+    p.buffer.clear();
+    p.buffer.resize(static_cast<std::size_t>(span + kBlock));
+    const auto address = reinterpret_cast<std::uintptr_t>(p.buffer.data());
+    p.data = p.buffer.data() + (kBlock - static_cast<std::int64_t>(address % kBlock)) % kBlock;
+  }
+  p.position = alignedStart;
   {
     std::lock_guard lock(p.mutex);
     p.inFlight = true;
   }
   try {
-    file.AsyncRead(p.buffer.data(), static_cast<std::uint64_t>(next),
-                   static_cast<std::uint64_t>(ahead),
+    file.AsyncRead(p.data, static_cast<std::uint64_t>(alignedStart),
+                   static_cast<std::uint64_t>(span),
                    [state = prefetch_](std::int32_t status, std::int32_t bytes) {
                      std::lock_guard lock(state->mutex);
                      state->result = {static_cast<FileStatus>(status), bytes};
