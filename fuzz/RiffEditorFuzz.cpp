@@ -228,59 +228,15 @@ void CheckAudioKept(const Scratch& scratch, const Bytes& original, const AudioRe
                   fresh.GetOffsetToChunkStart(audioTag), region.offset);
 }
 
-// Known: a chunk appended over a listed null-tag entry (zero fill) leaves
-// that entry in the list at the new chunk's offset, with its old length. A
-// later AddChunkData that cuts a chunk before it moves the stale entry's
-// bytes back first, scrambling the chunk written over it; once the stale
-// entry is junked (MaybeJunkSegment of the null tag, or UpdateUUIDsFromTags,
-// which junks it for having no identifier), the cut counts its missing
-// header and moves later chunks back over the end of the audio payload. The
-// edit sequence stops while such an entry is listed, so that the fuzzer
-// looks for other faults.
-bool HasStaleNullEntry(const RIFFFileEditor& editor) {
-  const auto& chunks = editor.GetChunkList();
-  for (std::size_t i = 0; i + 1 < chunks.size(); ++i)
-    if (chunks[i].first.tag == RIFFFileEditor::kNullTag &&
-        chunks[i].first.offset >= chunks[i + 1].first.offset)
-      return true;
-  return false;
-}
-
-// Known: two ways for a fresh listing to take a chunk that AddChunkData
-// appended for part of an audio chunk before it.
-//   - An "SSND" chunk with size 0 is listed as running to the end of the
-//     file, yet AddChunkData appends after it instead of fixing its size.
-//   - Any "data" or "SSND" chunk whose size passes the end of the file marks
-//     the audio as running to the end, but the next AddChunkData fixes the
-//     size of the chunks with the caller's audio tag only; when the open
-//     chunk has the other tag (a "data" chunk in a FORM file), its size stays
-//     and later chunks are appended inside it.
-bool AppendedIntoOpenAudio(const RIFFFileEditor& fresh, const Bytes& bytes, RIFFType audioTag) {
-  const auto& chunks = fresh.GetChunkList();
-  if (chunks.empty()) return false;
-  const auto& last = chunks.back().first;
-  if (last.tag != kSoundTag && last.tag != kDataTag) return false;
-  if (fresh.AudioRunsToEndOfFile() && last.tag != audioTag) return true;
-  if (last.tag != kSoundTag) return false;
-  const std::int64_t at = last.offset + (fresh.IsWave64() ? 16 : 4);
-  const int width = fresh.IsWave64() ? 8 : 4;
-  if (at + width > static_cast<std::int64_t>(bytes.size())) return false;
-  return std::all_of(bytes.begin() + at, bytes.begin() + at + width,
-                     [](std::uint8_t b) { return b == 0; });
-}
-
 // A chunk AddChunkData wrote reads back as written.
 void CheckWritten(const Scratch& scratch, RIFFFileEndian endian,
-                  RIFFFileEditor::FormatHandler& handler, RIFFType audioTag, RIFFType tag,
-                  const RCBlobMT& payload) {
+                  RIFFFileEditor::FormatHandler& handler, RIFFType tag, const RCBlobMT& payload) {
   RIFFFileEditor fresh(SpecOf(scratch.copy), endian, handler);
   try {
     fresh.ReadChunkLocations(nullptr);
   } catch (const TarnError& e) {
     Violation("the edited file no longer lists", e.GetIntErrorCode());
   }
-  if (!fresh.HasChunk(tag) && AppendedIntoOpenAudio(fresh, ReadBytes(scratch.copy), audioTag))
-    return;
   TARN_FUZZ_CHECK(fresh.HasChunk(tag), static_cast<std::int64_t>(tag));
   const RCBlobMT back = fresh.ReadChunkData(tag);
   TARN_FUZZ_CHECK(back.SameBytes(payload), back.GetSize(), payload.GetSize());
@@ -322,25 +278,9 @@ void EditCopy(const std::uint8_t* data, std::size_t size, const Bytes& original)
       std::fprintf(stderr, "listed %s at %lld length %lld\n", RIFFTypeToString(info.tag).c_str(),
                    static_cast<long long>(info.offset), static_cast<long long>(info.length));
   }
-  // Known (see AppendedIntoOpenAudio): chunks listed as audio that the edits
-  // do not treat as audio, and "SSND" chunks with size 0, make a fresh
-  // listing miss what is written after them, also once they are junked.
-  // Known too: when a cut chunk lies before a second audio chunk whose size
-  // AddChunkData fixes, that chunk's header is rewritten where it was instead
-  // of moving back, leaving stale bytes before it that end a fresh listing.
-  bool oddAudio = false;
-  int audioChunks = 0;
-  for (const auto& [info, action] : editor.GetChunkList()) {
-    if (info.tag != kDataTag && info.tag != kSoundTag) continue;
-    const std::int64_t at = info.offset + (editor.IsWave64() ? 16 : 4);
-    const bool sizeZero = at + 4 <= fileLength &&
-                          std::all_of(data + at, data + at + 4, [](auto b) { return b == 0; });
-    if (info.tag != audioTag || (info.tag == kSoundTag && sizeZero)) oddAudio = true;
-    if (info.tag == audioTag && ++audioChunks > 1) oddAudio = true;
-  }
   Control control(data, size);
   const int edits = control.Next() % kMaxEdits + 1;
-  for (int i = 0; i < edits && !HasStaleNullEntry(editor); ++i) {
+  for (int i = 0; i < edits; ++i) {
     const std::uint8_t op = control.Next();
     const RIFFType tag = kEditTags[(op >> 2) % std::size(kEditTags)];
     if (trace)
@@ -361,9 +301,8 @@ void EditCopy(const std::uint8_t* data, std::size_t size, const Bytes& original)
           CheckAudioKept(scratch, original, region, endian, handler, audioTag);
           // A file whose audio ran to its end only has its audio header
           // fixed; chunks named like audio or junk are not unique.
-          if (!runsToEnd && !oddAudio && tag != kDataTag && tag != kSoundTag &&
-              tag != RIFFFileEditor::kJunkTag)
-            CheckWritten(scratch, endian, handler, audioTag, tag, blob);
+          if (!runsToEnd && tag != kDataTag && tag != kSoundTag && tag != RIFFFileEditor::kJunkTag)
+            CheckWritten(scratch, endian, handler, tag, blob);
           break;
         }
         case 1:
@@ -376,21 +315,14 @@ void EditCopy(const std::uint8_t* data, std::size_t size, const Bytes& original)
           CheckAudioKept(scratch, original, region, endian, handler, audioTag);
           break;
         case 3:
-          // Known: the FORM handler has no identifiers, so this would turn
-          // every chunk, the audio chunk included, into junk at the next
-          // AddChunkData. Only the WAVE handler's files are given it.
-          if (!form) editor.UpdateUUIDsFromTags();
+          editor.UpdateUUIDsFromTags();
           break;
       }
     } catch (const TarnError& e) {
       if (trace) std::fprintf(stderr, "  threw %d\n", e.GetIntErrorCode());
-      // A refused or failed edit must still leave the audio alone.
+      // A refused or failed edit must still leave the audio alone, and the
+      // edits after it go on with the same editor.
       CheckAudioKept(scratch, original, region, endian, handler, audioTag);
-      // Known: an AddChunkData that fails half-way leaves the editor's list
-      // out of step with the file (moved chunks at their new offsets, cut
-      // ones still listed), and a retry on the same editor moves chunks by
-      // those stale offsets, over the audio payload. Editing stops here.
-      if ((op & 3) == 0) break;
     }
   }
 }

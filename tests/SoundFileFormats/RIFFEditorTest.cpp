@@ -115,7 +115,8 @@ TEST(RIFFEditorListing, LyingFilesStopOrStretchAsTheyShould) {
        Container::kFORM,
        {{kFmt, Pattern(4)}, {kSsnd, Pattern(9), 0, true}},
        {},
-       {{kFmt, 0, 4}, {kSsnd, 12, 10}}},
+       {{kFmt, 0, 4}, {kSsnd, 12, 10}},
+       true},
       {"data of length 0 stays empty",
        Container::kRIFF,
        {{kData, {}}, {kList, Pattern(2)}},
@@ -381,6 +382,36 @@ TEST(RIFFEditorEdits, UpdateUUIDsFromTagsJunksTagsWithoutIdentifier) {
       ReadFile(path),
       FileImage({{kFmt, Pattern(2)}, {kJunk, Pattern(6)}, {kData, Pattern(2)}, {kBext, Pattern(2)}},
                 Container::kRIFF));
+  // The AIFF handler names no identifiers: nothing is marked, the audio
+  // least of all.
+  const Bytes form = FileImage({{kFmt, Pattern(2)}, {kSsnd, Pattern(8)}}, Container::kFORM);
+  WriteFile(path, form);
+  const auto aiff = Editor(path, Container::kFORM);
+  aiff->UpdateUUIDsFromTags();
+  aiff->AddChunkData({kBext, {}, Blob(Pattern(2))}, kSsnd);
+  EXPECT_EQ(
+      ReadFile(path),
+      FileImage({{kFmt, Pattern(2)}, {kSsnd, Pattern(8)}, {kBext, Pattern(2)}}, Container::kFORM));
+}
+
+// Zero fill after the last chunk is listed as a null entry; a chunk
+// appended over it replaces the entry, and junking the null tag marks
+// nothing, so later cuts move only real chunks.
+TEST(RIFFEditorEdits, ChunksAppendedOverZeroFillReplaceIt) {
+  TempDir dir;
+  const auto path = dir.Path("f");
+  WriteFile(path, Cat({FileImage({{kData, Pattern(4)}, {kList, Pattern(6)}}, Container::kRIFF),
+                       Bytes(40)}));
+  const auto editor = Editor(path, Container::kRIFF);
+  ASSERT_EQ(editor->GetChunkList().back().first.tag, RIFFFileEditor::kNullTag);
+  editor->AddChunkData({kBext, {}, Blob(Pattern(3))}, kData);
+  editor->MaybeJunkSegment(RIFFFileEditor::kNullTag);
+  editor->AddChunkData({kList, {}, Blob(Pattern(9))}, kData);
+  const Bytes want =
+      FileImage({{kData, Pattern(4)}, {kBext, Pattern(3)}, {kList, Pattern(9)}}, Container::kRIFF);
+  EXPECT_EQ(ReadFile(path), want);
+  EXPECT_EQ(Describe(editor->GetChunkList()),
+            Describe(ChunkModel(want, Container::kRIFF).Listing()));
 }
 
 // Readers on several threads and a writer share one editor: the lock makes
@@ -423,6 +454,8 @@ class FailingFileStream : public CFileStream {
   FailingFileStream(const FileSpecification& spec, std::int64_t budget,
                     std::vector<std::int64_t>* writes)
       : CFileStream(spec, RIFFFileEditor::kStreamBufferSize), budget_(budget), writes_(writes) {}
+  // The disk has room again.
+  void Refill() { budget_ = INT64_MAX / 2; }
 
   void Drain() override {
     if (dirty_ && bufferLength_ > 0) {
@@ -486,9 +519,10 @@ const struct FaultEdit {
 };
 
 // Every kind of edit is stopped after each of its writes in turn, and
-// part-way through it. Whatever the point, the audio payload is
-// byte-for-byte intact and a fresh editor still lists the file up to and
-// including its audio chunk at the same place.
+// part-way through it, then retried on the same editor once the disk has
+// room again. Whatever the point, the audio payload is byte-for-byte intact
+// and a fresh editor still lists the file up to and including its audio
+// chunk at the same place, after the failure and after the retry.
 TEST(RIFFEditorFaults, EveryEditStoppedAtEveryWriteKeepsTheAudio) {
   TempDir dir;
   const auto path = dir.Path("f");
@@ -512,15 +546,31 @@ TEST(RIFFEditorFaults, EveryEditStoppedAtEveryWriteKeepsTheAudio) {
                                                          Padded(16, c) + Padded(20, c));
       const auto audioStart = static_cast<std::size_t>(audioOffset + HeaderSizeOf(c));
       const std::size_t audioEnd = audioStart + (edit.audioRunsToEnd ? 999 : 1001);
+      const auto expectAudioKept = [&] {
+        const Bytes after = ReadFile(path);
+        ASSERT_GE(after.size(), audioEnd);
+        ASSERT_EQ(Slice(after, audioStart, audioEnd), Slice(original, audioStart, audioEnd));
+        EXPECT_EQ(Editor(path, c)->GetOffsetToChunkStart(audioTag), audioOffset);
+      };
       // Runs the edit on a fresh copy; returns whether it failed.
-      const auto run = [&](std::int64_t budget, std::vector<std::int64_t>* writes) {
+      const auto run = [&](std::int64_t budget, std::vector<std::int64_t>* writes,
+                           bool retry = false) {
         WriteFile(path, original);
-        RIFFFileEditor editor(std::make_unique<FailingFileStream>(SpecOf(path), budget, writes),
-                              EndianOf(c), HandlerOf(c));
+        auto owned = std::make_unique<FailingFileStream>(SpecOf(path), budget, writes);
+        FailingFileStream& stream = *owned;
+        RIFFFileEditor editor(std::move(owned), EndianOf(c), HandlerOf(c));
         editor.ReadChunkLocations(nullptr);
         const int code = CodeOf([&] { edit.apply(editor, audioTag); });
         if (code != 1) {
           EXPECT_EQ(code, kIOErr);
+        }
+        if (code != 1 && retry) {
+          expectAudioKept();
+          stream.Refill();
+          // The retry either completes or, where the failure left a chunk
+          // cut short at the end, refuses before writing.
+          const int again = CodeOf([&] { edit.apply(editor, audioTag); });
+          EXPECT_TRUE(again == 1 || again == RIFFFileEditor::kChunkPastEndOfFile) << again;
         }
         return code != 1;
       };
@@ -539,11 +589,8 @@ TEST(RIFFEditorFaults, EveryEditStoppedAtEveryWriteKeepsTheAudio) {
       }
       for (std::int64_t budget : budgets) {
         SCOPED_TRACE("budget " + std::to_string(budget) + " of " + std::to_string(total));
-        ASSERT_TRUE(run(budget, nullptr));
-        const Bytes after = ReadFile(path);
-        ASSERT_GE(after.size(), audioEnd);
-        ASSERT_EQ(Slice(after, audioStart, audioEnd), Slice(original, audioStart, audioEnd));
-        EXPECT_EQ(Editor(path, c)->GetOffsetToChunkStart(audioTag), audioOffset);
+        ASSERT_TRUE(run(budget, nullptr, true));
+        expectAudioKept();
       }
       // With just enough budget the edit completes as before.
       ASSERT_FALSE(run(total, nullptr));

@@ -183,8 +183,14 @@ RIFFType RIFFFileEditor::ReadRIFFChunk() {
 }
 
 void RIFFFileEditor::ReadChunkLocations(StopParsingTester* tester) {
+  ForgetListing();
   ReadChunkLocationsExt(chunks_, tester);
   listed_ = true;
+}
+
+void RIFFFileEditor::ForgetListing() noexcept {
+  chunks_.clear();
+  audioRunsToEnd_ = listed_ = false;
 }
 
 void RIFFFileEditor::ReadChunkLocationsExt(ChunkList& list, StopParsingTester* tester) {
@@ -209,7 +215,12 @@ void RIFFFileEditor::ReadChunkLocationsExt(ChunkList& list, StopParsingTester* t
         audioRunsToEnd_ = true;
         length = fileLength - payloadStart;
       }
-      if (length == 0 && isAudio && header.tag == kSoundTag) length = fileLength - payloadStart;
+      if (length == 0 && isAudio && header.tag == kSoundTag && payloadStart < fileLength) {
+        // An "SSND" payload is never empty (it starts with its offset and
+        // block size): size 0 is a recording whose size was never written.
+        audioRunsToEnd_ = true;
+        length = fileLength - payloadStart;
+      }
       list.emplace_back(ChunkInfo{header.tag, header.uuid, headerStart, length}, kKeepSegment);
       if (header.tag == kNullTag || (tester != nullptr && tester->ShouldStop(header.tag)) ||
           payloadStart + length >= fileLength)
@@ -403,6 +414,17 @@ void RIFFFileEditor::JunkChunk(RIFFType tag, RIFFType audioTag) {
 void RIFFFileEditor::ApplySegmentActions(const ChunkData* chunk, const UUIDObj& uuid,
                                          RIFFType audioTag) {
   DetermineSegmentActions(chunk, audioTag);
+  try {
+    WriteSegmentActions(chunk, uuid);
+  } catch (...) {
+    // Chunks may have moved before the failure: the list no longer tells
+    // where they are, so the next edit lists the file again.
+    ForgetListing();
+    throw;
+  }
+}
+
+void RIFFFileEditor::WriteSegmentActions(const ChunkData* chunk, const UUIDObj& uuid) {
   Access access(*stream_, kTCLReadWriteMode);
 
   const int headerSize = GetRiffHeaderSize();
@@ -472,6 +494,8 @@ void RIFFFileEditor::ApplySegmentActions(const ChunkData* chunk, const UUIDObj& 
     stream_->MoveTo(GetIDSize());
     WriteLength(newEnd - headerSize);
     stream_->Truncate(newEnd);
+    // The new chunk took the place of any zero fill listed last.
+    if (!chunks_.empty() && chunks_.back().first.tag == kNullTag) chunks_.pop_back();
     chunks_.emplace_back(
         ChunkInfo{chunk->tag, wave64_ ? uuid : UUIDObj(), end, newEnd - end - headerSize},
         kKeepSegment);
@@ -481,6 +505,7 @@ void RIFFFileEditor::ApplySegmentActions(const ChunkData* chunk, const UUIDObj& 
 }
 
 void RIFFFileEditor::MaybeJunkSegment(RIFFType tag) {
+  if (tag == kNullTag) return;  // zero fill is no chunk to retire
   for (auto& [info, action] : chunks_) {
     if (info.tag == tag) {
       action = kJunkSegment;
@@ -538,12 +563,17 @@ RIFFType RIFFFileEditor::FindTagForID(std::uint32_t id) noexcept {
 }
 
 void RIFFFileEditor::UpdateUUIDsFromTags() {
+  // A handler without identifiers (chunk files that are never Wave64) would
+  // retire every chunk, the audio too.
+  const UUIDObj junk = handler_.UUIDForTag(kJunkTag, true);
+  if (junk.IsClear()) return;
   for (auto& [info, action] : chunks_) {
+    if (info.tag == kNullTag) continue;
     const UUIDObj uuid = handler_.UUIDForTag(info.tag, true);
     if (uuid.IsClear()) {
       action = kJunkSegment;
       info.tag = kJunkTag;
-      info.uuid = handler_.UUIDForTag(kJunkTag, true);
+      info.uuid = junk;
     } else {
       info.uuid = uuid;
     }

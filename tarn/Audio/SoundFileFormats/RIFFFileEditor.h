@@ -32,7 +32,12 @@
 // Only metadata regions are written: the bytes of the audio payload are never
 // read for an edit nor written. An edit that fails half-way (full disk, I/O
 // error) leaves the audio payload intact and the chunks up to and including
-// the audio chunk listable; the chunks after the audio may be partly moved.
+// the audio chunk listable; the chunks after the audio may be partly moved,
+// so the editor forgets its listing and the next edit lists the file again.
+//
+// Only the container's first audio chunk ("data" in RIFF and Wave64,
+// "SSND" in FORM) is the audio; any later one, and the other container's
+// audio tag, is metadata like any other chunk.
 //
 // The editor opens its file only for the length of an operation and restores
 // the stream's earlier access afterwards (a closed stream is closed again),
@@ -50,8 +55,9 @@
 // file is touched; stream errors (-36 I/O, -39 end of file, -5000 cannot
 // open) propagate. A damaged or truncated chunk header, or a non-audio chunk
 // whose size is larger than the whole file, ends the listing silently: the
-// chunks before it stay listed. An audio chunk that large is listed as
-// running to the end of the file (AudioRunsToEndOfFile).
+// chunks before it stay listed. An audio chunk that large, or an "SSND"
+// chunk of size 0 with bytes after its header, is listed as running to the
+// end of the file (AudioRunsToEndOfFile).
 //
 // Threads: ReadChunkData, AddChunkData, JunkChunk, CountPostAudioChunks,
 // GetNthPostAudioChunks, RemoveTrailingMetaData and Reset take the editor's
@@ -177,10 +183,9 @@ class RIFFFileEditor {
   // Empties the list and moves the editor to another file (a new stream).
   void Reset(const FileSpecification& spec);
 
-  // Lists the chunks, seeking from header to header; `tester` may be null.
-  // Entries are appended, so this is done once per editor (after
-  // construction or Reset). Throws "RIFFFileEditor" 0 for a file that is
-  // not an accepted container.
+  // Lists the chunks, seeking from header to header, in place of any
+  // earlier listing; `tester` may be null. Throws "RIFFFileEditor" 0 for a
+  // file that is not an accepted container.
   void ReadChunkLocations(StopParsingTester* tester);
 
   [[nodiscard]] bool HasChunk(RIFFType tag) const;
@@ -199,7 +204,8 @@ class RIFFFileEditor {
   // the audio chunk's tag ("data", "SSND").
   void AddChunkData(const ChunkData& chunk, RIFFType audioTag);
   // Marks the first chunk with the tag to become junk at the next
-  // AddChunkData (in place before the audio, cut out after it).
+  // AddChunkData (in place before the audio, cut out after it). The null
+  // tag (zero fill) marks nothing.
   void MaybeJunkSegment(RIFFType tag);
   // Retires the first chunk with the tag now, writing nothing new: before
   // the audio it is renamed "JUNK" in place (size and payload kept); after
@@ -228,7 +234,8 @@ class RIFFFileEditor {
   [[nodiscard]] static RIFFType FindTagForID(std::uint32_t id) noexcept;
 
   // Gives every listed chunk its tag's identifier; a chunk whose tag has
-  // none becomes junk at the next AddChunkData.
+  // none becomes junk at the next AddChunkData. Does nothing with a handler
+  // that has no identifiers (FORM files).
   void UpdateUUIDsFromTags();
 
   // The listing as it stands, and the file facts found while listing.
@@ -256,6 +263,8 @@ class RIFFFileEditor {
   // chunks), and carrying them out.
   void DetermineSegmentActions(const ChunkData* chunk, RIFFType audioTag);
   void ApplySegmentActions(const ChunkData* chunk, const UUIDObj& uuid, RIFFType audioTag);
+  void WriteSegmentActions(const ChunkData* chunk, const UUIDObj& uuid);
+  void ForgetListing() noexcept;
   void JunkThisSegment(ChunkInfo& info);
   void OverwriteThisSegment(ChunkInfo& info, const ChunkData& chunk, const UUIDObj& uuid);
   void MoveThisSegmentBack(ChunkInfo& info, std::int64_t shift);
