@@ -1,3 +1,4 @@
+#include <cstdint>
 #include <cstring>
 
 #include "tarn/Audio/AudioChainKernelsImpl.h"
@@ -5,25 +6,97 @@
 namespace tarn::chainimpl {
 namespace {
 
+// A 3-byte sample moves as one 4-byte load and store. The extra byte stored
+// belongs to a sample that is written after it (the same channel's next
+// sample, or the next one in the frame), and the extra byte loaded lies
+// inside the buffer; the last frame moves its samples exactly.
+template <int B, bool kWide>
+inline void MoveSample(unsigned char* dst, const unsigned char* src) noexcept {
+  if constexpr (kWide) {
+    std::uint32_t word = 0;
+    std::memcpy(&word, src, 4);
+    std::memcpy(dst, &word, 4);
+  } else {
+    std::memcpy(dst, src, B);
+  }
+}
+
+template <int B>
+constexpr bool kWidens = B == 3;
+
+// Stereo, the common case, walks frame by frame: the interleaved side is
+// read or written once, in order.
+template <int B, bool kWide>
+void DeinterleaveStereo(const unsigned char* in, unsigned char* left, unsigned char* right,
+                        std::size_t first, std::size_t end) noexcept {
+  for (std::size_t i = first; i < end; ++i) {
+    MoveSample<B, kWide>(left + i * B, in + i * 2 * B);
+    MoveSample<B, kWide>(right + i * B, in + i * 2 * B + B);
+  }
+}
+
+template <int B, bool kWide>
+void InterleaveStereo(const unsigned char* left, const unsigned char* right, unsigned char* out,
+                      std::size_t first, std::size_t end) noexcept {
+  for (std::size_t i = first; i < end; ++i) {
+    MoveSample<B, kWide>(out + i * 2 * B, left + i * B);
+    MoveSample<B, kWide>(out + i * 2 * B + B, right + i * B);
+  }
+}
+
+// More channels go one channel at a time.
+template <int B, bool kWide>
+void DeinterleaveChannel(const unsigned char* src, unsigned char* dst, std::size_t stride,
+                         std::size_t first, std::size_t end) noexcept {
+  for (std::size_t i = first; i < end; ++i) MoveSample<B, kWide>(dst + i * B, src + i * stride);
+}
+
+template <int B, bool kWide>
+void InterleaveChannel(const unsigned char* src, unsigned char* dst, std::size_t stride,
+                       std::size_t first, std::size_t end) noexcept {
+  for (std::size_t i = first; i < end; ++i) MoveSample<B, kWide>(dst + i * stride, src + i * B);
+}
+
 template <int B>
 void DeinterleaveN(const unsigned char* in, void* const* channels, int numChannels,
                    std::size_t frames, std::size_t offset) noexcept {
+  const std::size_t wide = kWidens<B> && frames > 0 ? frames - 1 : 0;
+  const auto out = [&](int c) { return static_cast<unsigned char*>(channels[c]) + offset * B; };
+  if (numChannels == 2) {
+    DeinterleaveStereo<B, kWidens<B>>(in, out(0), out(1), 0, wide);
+    DeinterleaveStereo<B, false>(in, out(0), out(1), wide, frames);
+    return;
+  }
   const std::size_t stride = static_cast<std::size_t>(numChannels) * B;
   for (int c = 0; c < numChannels; ++c) {
     const unsigned char* src = in + static_cast<std::size_t>(c) * B;
-    unsigned char* dst = static_cast<unsigned char*>(channels[c]) + offset * B;
-    for (std::size_t i = 0; i < frames; ++i) std::memcpy(dst + i * B, src + i * stride, B);
+    DeinterleaveChannel<B, kWidens<B>>(src, out(c), stride, 0, wide);
+    DeinterleaveChannel<B, false>(src, out(c), stride, wide, frames);
   }
 }
 
 template <int B>
 void InterleaveN(const void* const* channels, std::size_t offset, unsigned char* out,
                  int numChannels, std::size_t frames) noexcept {
+  const std::size_t wide = kWidens<B> && frames > 0 ? frames - 1 : 0;
+  const auto in = [&](int c) {
+    return static_cast<const unsigned char*>(channels[c]) + offset * B;
+  };
+  if (numChannels == 2) {
+    InterleaveStereo<B, kWidens<B>>(in(0), in(1), out, 0, wide);
+    InterleaveStereo<B, false>(in(0), in(1), out, wide, frames);
+    return;
+  }
   const std::size_t stride = static_cast<std::size_t>(numChannels) * B;
+  // Channel by channel, a wide store reaches into the next channel's sample,
+  // which that channel's pass rewrites afterwards; the last channel's would
+  // reach into the next frame's first sample, written already, so it moves
+  // its samples exactly.
   for (int c = 0; c < numChannels; ++c) {
-    const unsigned char* src = static_cast<const unsigned char*>(channels[c]) + offset * B;
     unsigned char* dst = out + static_cast<std::size_t>(c) * B;
-    for (std::size_t i = 0; i < frames; ++i) std::memcpy(dst + i * stride, src + i * B, B);
+    const std::size_t mid = c + 1 < numChannels ? wide : 0;
+    InterleaveChannel<B, kWidens<B>>(in(c), dst, stride, 0, mid);
+    InterleaveChannel<B, false>(in(c), dst, stride, mid, frames);
   }
 }
 
