@@ -1,6 +1,7 @@
-// Prints a WAVE file's header facts and peak level, read through
+// Prints a sound file's header facts and peak level, read through
 // SoundFileReader, and lists its chunks with the chunk editor.
 #include <cmath>
+#include <cstdint>
 #include <cstdio>
 #include <vector>
 
@@ -11,7 +12,7 @@
 
 int main(int argc, char** argv) {
   if (argc != 2) {
-    std::fprintf(stderr, "usage: tarn_sound_file_info /absolute/path/file.wav\n");
+    std::fprintf(stderr, "usage: tarn_sound_file_info /absolute/path/file\n");
     return 2;
   }
   try {
@@ -27,7 +28,13 @@ int main(int argc, char** argv) {
                 static_cast<long long>(file.GetLengthInFrames().AsLongLong()),
                 file.GetAttributes().mOffsetToAudio, peak);
 
-    tarn::RIFFFileEditor editor(spec, tarn::kRIFFLittleEndian, tarn::GetWaveRIFFFormatHandler());
+    // AIFF and AIFC files are big-endian chunk files with their own tags.
+    const std::uint32_t type = file.GetAttributes().mFileType;
+    const bool aiff = type == tarn::MakeRIFFType("AIFF") || type == tarn::MakeRIFFType("AIFC");
+    tarn::RIFFFileEditor editor(
+        spec, aiff ? tarn::kRIFFBigEndian : tarn::kRIFFLittleEndian,
+        aiff ? static_cast<tarn::RIFFFileEditor::FormatHandler&>(tarn::GetAIFFRIFFFormatHandler())
+             : tarn::GetWaveRIFFFormatHandler());
     editor.ReadChunkLocations(nullptr);
     for (const auto& [chunk, action] : editor.GetChunkList())
       std::printf("  '%s' at %lld, %lld bytes\n", tarn::RIFFTypeToString(chunk.tag).c_str(),

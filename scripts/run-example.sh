@@ -19,5 +19,7 @@ trap 'rm -rf "$scratch"' EXIT
 build/default/example-cmake/tarn_write_tone "$scratch/tone.wav"
 build/default/example-cmake/tarn_edit_bext "$scratch/tone.wav" "Example tone"
 build/default/example-cmake/tarn_sound_file_info "$scratch/tone.wav"
+build/default/example-cmake/tarn_convert_copy "$scratch/tone.wav" "$scratch/tone.aif"
+build/default/example-cmake/tarn_sound_file_info "$scratch/tone.aif"
 
 build/default/tools/tarnfile/tarnfile demo
