@@ -10,9 +10,12 @@
 //     starts where the one before ends, each header lies inside the file;
 //   - the queries agree with the listing, and chunk data read back is the
 //     file's own bytes, never more than the file holds;
-//   - after every edit the audio payload (the bytes of the first audio chunk
-//     that lie inside the original file) is byte-identical, and a fresh
-//     editor still lists the audio chunk at its old offset;
+//   - after every edit (AddChunkData, MaybeJunkSegment, JunkChunk,
+//     RemoveTrailingMetaData, UpdateUUIDsFromTags, in a sequence the input
+//     chooses, going on after a failed one) the audio payload (the bytes of
+//     the first audio chunk that lie inside the original file) is
+//     byte-identical, and a fresh editor still lists the audio chunk at its
+//     old offset;
 //   - a chunk that AddChunkData reports written reads back from a fresh
 //     editor with the payload given.
 
@@ -305,11 +308,20 @@ void EditCopy(const std::uint8_t* data, std::size_t size, const Bytes& original)
             CheckWritten(scratch, endian, handler, tag, blob);
           break;
         }
-        case 1:
+        case 1: {
           // Junking the audio chunk itself is the caller's choice, not a
-          // fault of the editor: the audio tag is never passed.
-          editor.MaybeJunkSegment(tag == audioTag ? MakeRIFFType("LIST") : tag);
+          // fault of the editor: the audio tag is never passed. A control
+          // byte picks marking the chunk or retiring it now.
+          const RIFFType junk = tag == audioTag ? MakeRIFFType("LIST") : tag;
+          if ((control.Next() & 1) == 0) {
+            editor.MaybeJunkSegment(junk);
+          } else {
+            if (trace) std::fprintf(stderr, "  JunkChunk\n");
+            editor.JunkChunk(junk, audioTag);
+            CheckAudioKept(scratch, original, region, endian, handler, audioTag);
+          }
           break;
+        }
         case 2:
           editor.RemoveTrailingMetaData(audioTag);
           CheckAudioKept(scratch, original, region, endian, handler, audioTag);

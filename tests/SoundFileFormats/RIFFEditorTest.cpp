@@ -336,7 +336,8 @@ TEST(RIFFEditorEdits, AudioRunningPastTheEndIsFixedFirstAndAMissingPadByteRestor
 
 // A last chunk cut short stays listed at its claimed size; an edit then
 // refuses to start rather than move or append around missing bytes. So
-// does a Wave64 chunk without an identifier, unless the caller gives one.
+// does a Wave64 chunk without an identifier, unless the caller gives one,
+// and an empty "SSND" chunk.
 TEST(RIFFEditorEdits, EditsThatCannotBeDoneAreRefusedUntouched) {
   TempDir dir;
   const auto path = dir.Path("f");
@@ -363,6 +364,14 @@ TEST(RIFFEditorEdits, EditsThatCannotBeDoneAreRefusedUntouched) {
   const UUIDObj own(UString("0f1e2d3c-4b5a-6978-8796-a5b4c3d2e1f0"));
   editor.AddChunkData({T("zzzz"), own, Blob(Pattern(2))}, kData);
   EXPECT_EQ(Slice(ReadFile(path), 72, 88), Bytes(own.GetBytes().begin(), own.GetBytes().end()));
+  // An empty "SSND" would make every later chunk part of the audio.
+  const Bytes form = FileImage({{kFmt, Pattern(2)}}, Container::kFORM);
+  WriteFile(path, form);
+  EXPECT_EQ(CodeOf([&] {
+              Editor(path, Container::kFORM)->AddChunkData({kSsnd, {}, {}}, kSsnd);
+            }),
+            -50);
+  EXPECT_EQ(ReadFile(path), form);
 }
 
 TEST(RIFFEditorEdits, UpdateUUIDsFromTagsJunksTagsWithoutIdentifier) {

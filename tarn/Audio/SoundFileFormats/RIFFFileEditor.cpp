@@ -387,6 +387,10 @@ void RIFFFileEditor::RemoveOverwrittenChunks() {
 void RIFFFileEditor::AddChunkData(const ChunkData& chunk, RIFFType audioTag) {
   std::lock_guard hold(lock_);
   if (chunk.tag == kNullTag) Failure(kParamErr);
+  // An empty "SSND" chunk reads as a recording that runs to the end of the
+  // file: every chunk after it would be taken for audio.
+  if (endian_ == kRIFFBigEndian && chunk.tag == kSoundTag && chunk.data.GetSize() == 0)
+    Failure(kParamErr);
   EnsureListed();
   const UUIDObj uuid =
       !wave64_ || !chunk.uuid.IsClear() ? chunk.uuid : MaybeTranslateRiffType(chunk.tag);
