@@ -316,6 +316,22 @@ void BuddySystemSubAllocator::Tidy() noexcept {
   }
 }
 
+void BuddySystemSubAllocator::BecomeOrphan() noexcept {
+  fSpareLimit = 0;
+  Tidy();
+  for (int c = fSmallestChunkClass; c <= fChunkClass && fSpareChunks != 0; ++c) {
+    uint8_t* block = fFreeLists[c];
+    while (block) {
+      uint8_t* next = NextOf(block);
+      if (HeaderSide(Load32(block)) == kRoot) {
+        ListRemove(c, block);
+        HydraAllocator::GlobalPool().GiveBack(block - 16);
+      }
+      block = next;
+    }
+  }
+}
+
 uint8_t* BuddySystemSubAllocator::TakeBlock(int c) noexcept {
   if (uint8_t* block = fQuick[c]) {
     fQuick[c] = NextOf(block);
@@ -391,7 +407,7 @@ void BuddySystemSubAllocator::FreeBlockMerging(uint8_t* block) noexcept {
     Store32(block, h);
   }
   if (HeaderSide(h) == kRoot) {
-    if (fSpareChunks == kSpareChunks) {
+    if (fSpareChunks >= fSpareLimit) {
       HydraAllocator::GlobalPool().GiveBack(block - 16);
       return;
     }
@@ -637,10 +653,6 @@ void HydraGlobalPool::PushOrphan(BuddySystemSubAllocator* orphan) noexcept {
   EnqueueAtomic(&fOrphans, orphan);
 }
 
-BuddySystemSubAllocator* HydraGlobalPool::PopOrphans() noexcept {
-  return static_cast<BuddySystemSubAllocator*>(DetachAtomic(&fOrphans));
-}
-
 void HydraGlobalPool::CollectOrphans() noexcept {
   // Move new orphans onto our own list (the pool thread alone touches it).
   while (BuddySystemSubAllocator* orphan = HydraAllocator::Instance().GetSubAllocatorOrphan()) {
@@ -724,7 +736,20 @@ void HydraAllocator::SetIgnoreUnknownDeallocations(bool ignore) noexcept {
 
 BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorForCurrentThread() noexcept {
   if (BuddySystemSubAllocator* s = tCurrent) return s;
-  BuddySystemSubAllocator* s = BuddySystemSubAllocator::Create();
+  // A new thread takes over an orphan not yet moved to the pool thread's
+  // list, if there is one: the blocks the orphan still has out are then
+  // freed by its new owner as they come back, not half a second later by
+  // the pool thread, and its chunks serve the new thread at once. Programs
+  // that start a thread per task keep a handful of sub-allocators instead
+  // of one per recently ended thread.
+  BuddySystemSubAllocator* s = GetSubAllocatorOrphan();
+  if (s) {
+    s->next = nullptr;
+    s->BecomeAdopted();
+    fPool->fOrphanCount.fetch_sub(1);
+  } else {
+    s = BuddySystemSubAllocator::Create();
+  }
   if (!s) return nullptr;
   hydra_os::SetThreadKey(s);
   tCurrent = s;
@@ -732,9 +757,14 @@ BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorForCurrentThread() noexc
 }
 
 BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorOrphan() noexcept {
-  // Only the pool thread pops orphans (and only it destroys them), so a
-  // popped node is never freed while another pop reads its link.
-  return static_cast<BuddySystemSubAllocator*>(DequeueAtomic(&fPool->fOrphans));
+  // Pops are serialized: a popped orphan may be destroyed (by the pool
+  // thread, or by its adopter's thread ending), so no other pop may still be
+  // reading its link. Pushes need no lock.
+  while (fPool->fOrphanPopLock.test_and_set(std::memory_order_acquire))
+    hydra_os::SleepMilliseconds(0);
+  void* orphan = DequeueAtomic(&fPool->fOrphans);
+  fPool->fOrphanPopLock.clear(std::memory_order_release);
+  return static_cast<BuddySystemSubAllocator*>(orphan);
 }
 
 void HydraAllocator::SubAllocatorDestructor(void* subAllocator) noexcept {
@@ -742,9 +772,10 @@ void HydraAllocator::SubAllocatorDestructor(void* subAllocator) noexcept {
   if (!s) return;
   if (tCurrent == s) tCurrent = nullptr;
   s->DrainRemoteFrees();
-  if (s->HoldsLiveBlocks())
+  if (s->HoldsLiveBlocks()) {
+    s->BecomeOrphan();
     GlobalPool().PushOrphan(s);
-  else
+  } else
     BuddySystemSubAllocator::Destroy(s);
 }
 

@@ -12,9 +12,12 @@
 // bytes come from a process-wide pool of pre-allocated 53,232-byte chunks,
 // kept between 256 and 275 chunks by a background thread that wakes every
 // 100 ms; that thread also collects the sub-allocators of ended threads
-// (orphans) once their last block has been freed elsewhere. For reuse, each
-// thread keeps up to eight free chunks and up to 32 KB of freed blocks per
-// size class; they go back to the pool when the thread ends.
+// (orphans) once their last block has been freed elsewhere, unless a new
+// thread has taken one over first (a thread's first allocation adopts a
+// recent orphan when there is one, instead of creating a sub-allocator).
+// For reuse, each thread keeps up to eight free chunks and up to 32 KB of
+// freed blocks per size class; they go back to the pool when the thread
+// ends, and an orphan gives back each chunk as soon as it is free.
 //
 // What callers may rely on:
 // - Every block is zero-filled and 16-byte aligned (the prefix in front of

@@ -75,7 +75,6 @@ class HydraGlobalPool {
   void GiveBack(void* chunk) noexcept;
 
   void PushOrphan(BuddySystemSubAllocator* orphan) noexcept;
-  [[nodiscard]] BuddySystemSubAllocator* PopOrphans() noexcept;  // the whole chain
 
   // Starts the pool thread (once).
   void StartPoolThread() noexcept;
@@ -115,6 +114,10 @@ class HydraGlobalPool {
   std::atomic<uint64_t> fOrphanCount{0};
   std::atomic<bool> fThreadStarted{false};
   std::atomic_flag fNodeBatchLock = ATOMIC_FLAG_INIT;
+  // Held for each pop of fOrphans (the pool thread's, and a new thread's
+  // adopting an orphan), so that no pop reads the link of an orphan that
+  // another popper took and destroyed.
+  std::atomic_flag fOrphanPopLock = ATOMIC_FLAG_INIT;
   BuddySystemSubAllocator* fHeldOrphans = nullptr;  // pool thread only
 };
 
@@ -189,6 +192,13 @@ class alignas(16) BuddySystemSubAllocator {
   }
   // Usable bytes of a block of this allocator or a large block.
   [[nodiscard]] static std::size_t Capacity(void* user) noexcept;
+  // As its thread ends while blocks are still live: merges the quick lists
+  // and gives every fully merged chunk back, and from then on gives back
+  // each chunk as soon as it is fully merged, so that an orphan holds no
+  // more than its live blocks need.
+  void BecomeOrphan() noexcept;
+  // Taken over by a new thread: keeps spare chunks again.
+  void BecomeAdopted() noexcept { fSpareLimit = kSpareChunks; }
 
   // Figures, written only by the owning thread, read by anyone.
   std::atomic<uint64_t> bytesInUse{0};
@@ -239,9 +249,11 @@ class alignas(16) BuddySystemSubAllocator {
   // kSpareChunks, instead of being given back, so that a thread whose use
   // swings around a chunk boundary does not take chunks from the pool and
   // give them back all the time.
-  // Invariant: fSpareChunks == number of root blocks on the free lists.
+  // Invariant: fSpareChunks == number of root blocks on the free lists
+  // <= fSpareLimit (kSpareChunks, or 0 while orphaned).
   static constexpr uint32_t kSpareChunks = 8;
   uint32_t fSpareChunks = 0;
+  uint32_t fSpareLimit = kSpareChunks;
   uint64_t fLargeBlocks = 0;  // live blocks taken from the pool directly
 };
 

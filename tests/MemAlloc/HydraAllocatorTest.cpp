@@ -278,6 +278,34 @@ TEST(HydraAllocator, OrphanCollectedAfterLastBlockFreed) {
   EXPECT_LT(std::chrono::steady_clock::now() - freedAt, std::chrono::seconds(2));
 }
 
+// A thread's first allocation takes over an orphan not yet moved to the
+// pool thread's list: the new thread's blocks carry the orphan as owner, the
+// orphan count drops, and the orphan's block freed elsewhere goes back to
+// its new owner. (The pool thread moves orphans every 500 ms; a move right
+// between the two threads makes an attempt inconclusive, so it retries.)
+TEST(HydraAllocator, NewThreadAdoptsRecentOrphan) {
+  bool adopted = false;
+  for (int attempt = 0; attempt < 5 && !adopted; ++attempt) {
+    const uint64_t orphans = HydraDebugging::OrphanedSubAllocators();
+    void* kept = nullptr;
+    std::thread([&] { kept = Heap().Allocate(500); }).join();
+    ASSERT_EQ(HydraDebugging::OrphanedSubAllocators(), orphans + 1);
+    uint64_t ownerOnNew = 0, orphansWhileNew = 0;
+    std::thread([&] {
+      void* onNew = Heap().Allocate(500);
+      ownerOnNew = Word64(onNew, -12);
+      orphansWhileNew = HydraDebugging::OrphanedSubAllocators();
+      Heap().Deallocate(onNew);
+    }).join();
+    adopted = ownerOnNew == Word64(kept, -12);
+    if (adopted) {
+      EXPECT_EQ(orphansWhileNew, orphans);
+    }
+    Heap().Deallocate(kept);
+  }
+  EXPECT_TRUE(adopted);
+}
+
 TEST(HydraAllocator, IgnoreUnknownDeallocationsFlag) {
   EXPECT_FALSE(Heap().GetIgnoreUnknownDeallocations());
   Heap().SetIgnoreUnknownDeallocations(true);
