@@ -654,21 +654,23 @@ void HydraGlobalPool::PushOrphan(BuddySystemSubAllocator* orphan) noexcept {
 }
 
 void HydraGlobalPool::CollectOrphans() noexcept {
-  // Move new orphans onto our own list (the pool thread alone touches it).
+  // Take every orphan, destroy those whose blocks have all come back, and
+  // put the others back on the stack, where a new thread may still adopt
+  // them.
+  BuddySystemSubAllocator* held = nullptr;
   while (BuddySystemSubAllocator* orphan = HydraAllocator::Instance().GetSubAllocatorOrphan()) {
-    orphan->next = fHeldOrphans;
-    fHeldOrphans = orphan;
+    orphan->next = held;
+    held = orphan;
   }
-  BuddySystemSubAllocator** link = &fHeldOrphans;
-  while (BuddySystemSubAllocator* orphan = *link) {
+  while (BuddySystemSubAllocator* orphan = held) {
+    held = orphan->next;
     orphan->DrainRemoteFrees();
     if (orphan->HoldsLiveBlocks()) {
-      link = &orphan->next;
-      continue;
+      EnqueueAtomic(&fOrphans, orphan);
+    } else {
+      BuddySystemSubAllocator::Destroy(orphan);
+      fOrphanCount.fetch_sub(1);
     }
-    *link = orphan->next;
-    BuddySystemSubAllocator::Destroy(orphan);
-    fOrphanCount.fetch_sub(1);
   }
 }
 
@@ -736,10 +738,10 @@ void HydraAllocator::SetIgnoreUnknownDeallocations(bool ignore) noexcept {
 
 BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorForCurrentThread() noexcept {
   if (BuddySystemSubAllocator* s = tCurrent) return s;
-  // A new thread takes over an orphan not yet moved to the pool thread's
-  // list, if there is one: the blocks the orphan still has out are then
-  // freed by its new owner as they come back, not half a second later by
-  // the pool thread, and its chunks serve the new thread at once. Programs
+  // A new thread takes over an orphan, if there is one: the blocks the
+  // orphan still has out are then freed by its new owner as they come back,
+  // not up to half a second later by the pool thread, and its chunks serve
+  // the new thread at once. Programs
   // that start a thread per task keep a handful of sub-allocators instead
   // of one per recently ended thread.
   BuddySystemSubAllocator* s = GetSubAllocatorOrphan();

@@ -118,7 +118,6 @@ class HydraGlobalPool {
   // adopting an orphan), so that no pop reads the link of an orphan that
   // another popper took and destroyed.
   std::atomic_flag fOrphanPopLock = ATOMIC_FLAG_INIT;
-  BuddySystemSubAllocator* fHeldOrphans = nullptr;  // pool thread only
 };
 
 // ---- The per-thread buddy pool -----------------------------------------

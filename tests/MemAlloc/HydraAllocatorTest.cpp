@@ -278,11 +278,11 @@ TEST(HydraAllocator, OrphanCollectedAfterLastBlockFreed) {
   EXPECT_LT(std::chrono::steady_clock::now() - freedAt, std::chrono::seconds(2));
 }
 
-// A thread's first allocation takes over an orphan not yet moved to the
-// pool thread's list: the new thread's blocks carry the orphan as owner, the
-// orphan count drops, and the orphan's block freed elsewhere goes back to
-// its new owner. (The pool thread moves orphans every 500 ms; a move right
-// between the two threads makes an attempt inconclusive, so it retries.)
+// A thread's first allocation takes over a waiting orphan: the new
+// thread's blocks carry the orphan as owner, the orphan count drops, and the
+// orphan's block freed elsewhere goes back to its new owner. (The pool
+// thread takes the orphans off their stack for a moment every 500 ms; an
+// attempt that falls into that moment is inconclusive, so it retries.)
 TEST(HydraAllocator, NewThreadAdoptsRecentOrphan) {
   bool adopted = false;
   for (int attempt = 0; attempt < 5 && !adopted; ++attempt) {
