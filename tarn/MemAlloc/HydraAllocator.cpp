@@ -20,7 +20,10 @@ struct ClassTable {
   std::array<uint64_t, 255> sizes{};
   int count = 0;
   std::array<uint8_t, 256> small{};
-  std::array<uint32_t, 255> quickCap{};  // up to 32 KB of unmerged blocks, at least 4
+  // Blocks a quick list may hold: 128 KB of blocks up to 1088 bytes (the
+  // classes of requests up to 1 KB, which come and go in the largest
+  // numbers), 32 KB of larger ones, and at least 4.
+  std::array<uint32_t, 255> quickCap{};
 };
 
 constexpr ClassTable MakeClassTable() {
@@ -34,7 +37,7 @@ constexpr ClassTable MakeClassTable() {
     t.sizes[t.count++] = a + b;
   }
   for (int k = 0; k < t.count; ++k) {
-    const uint64_t n = 32'768 / t.sizes[k];
+    const uint64_t n = (t.sizes[k] <= 1088 ? 131'072 : 32'768) / t.sizes[k];
     t.quickCap[k] = n < 4 ? 4 : static_cast<uint32_t>(n);
   }
   for (int i = 0, k = 0; i < 256; ++i) {
@@ -60,6 +63,7 @@ inline int ClassForNeed(uint64_t need) noexcept {
 int HydraSizeClasses::Count() noexcept { return kClasses.count; }
 uint64_t HydraSizeClasses::Size(int k) noexcept { return kClasses.sizes[k]; }
 int HydraSizeClasses::SmallIndex(int i) noexcept { return kClasses.small[i]; }
+uint32_t HydraSizeClasses::CachedBlocks(int k) noexcept { return kClasses.quickCap[k]; }
 int HydraSizeClasses::ClassFor(uint64_t bytes) noexcept {
   if (bytes < 1024) return kClasses.small[(bytes + 3) / 4];
   return ClassForNeed(bytes);

@@ -239,8 +239,8 @@ class alignas(16) BuddySystemSubAllocator {
   // freed and allocated again in the same class skips the split and merge
   // steps; the lists are merged (tidied) before the pool grows and when the
   // sub-allocator is destroyed.
-  // Invariant: fQuickCount[c] == length of fQuick[c] <= the class's cap
-  // (32 KB of blocks, at least 4).
+  // Invariant: fQuickCount[c] == length of fQuick[c] <=
+  // HydraSizeClasses::CachedBlocks(c).
   uint8_t* fQuick[kMaxClasses] = {};
   uint32_t fQuickCount[kMaxClasses] = {};
   bool fNeedsTidying = false;  // some quick list is non-empty
