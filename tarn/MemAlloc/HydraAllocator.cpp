@@ -96,20 +96,17 @@ inline void StoreOwner(uint8_t* at, BuddySystemSubAllocator* o) noexcept {
 // Kept out of line so that the compiler, not knowing the size's bound, calls
 // the C runtime's memset (wide vector stores) rather than the string
 // instructions it picks for a bounded size.
-[[gnu::noinline]] void ZeroWide(uint8_t* p, std::size_t bytes) noexcept {
-  std::memset(p, 0, bytes);
+[[gnu::noinline]] void* ZeroWide(uint8_t* p, std::size_t bytes) noexcept {
+  return std::memset(p, 0, bytes);
 }
 
 // Zero-fills the buddy block's user area p (16-byte aligned) for rounded
 // bytes. Short areas are filled in whole 16-byte units (a block's user area
 // always ends on such a unit: class sizes are multiples of 32) by plain
 // vector stores, which beat both a call and the string instructions.
-inline void ZeroUserArea(uint8_t* p, std::size_t rounded) noexcept {
+inline void* ZeroUserArea(uint8_t* p, std::size_t rounded) noexcept {
 #if defined(__GNUC__)
-  if (rounded > 192) {
-    ZeroWide(p, rounded);
-    return;
-  }
+  if (rounded > 192) return ZeroWide(p, rounded);  // a tail call
   using Unit = long long __attribute__((vector_size(16), may_alias));
   auto* unit = reinterpret_cast<Unit*>(p);
   Unit* const end = unit + (rounded + 15) / 16;
@@ -120,8 +117,9 @@ inline void ZeroUserArea(uint8_t* p, std::size_t rounded) noexcept {
     __asm__("" : : "r"(unit) : "memory");  // keeps the loop from becoming a memset call
   }
   if (unit != end) *unit = zero;
+  return p;
 #else
-  std::memset(p, 0, rounded);
+  return std::memset(p, 0, rounded);
 #endif
 }
 
@@ -303,9 +301,13 @@ static inline bool CanServe(int x, int c) noexcept {
   return x == c || (x == c + 1 && c >= 1) || x >= c + 2;
 }
 
+bool BuddySystemSubAllocator::HasQuickBlocks() const noexcept {
+  for (int c = 0; c <= fChunkClass; ++c)
+    if (fQuick[c]) return true;
+  return false;
+}
+
 void BuddySystemSubAllocator::Tidy() noexcept {
-  if (!fNeedsTidying) return;
-  fNeedsTidying = false;
   for (int c = 0; c <= fChunkClass; ++c) {
     uint8_t* block = fQuick[c];
     fQuick[c] = nullptr;
@@ -345,7 +347,7 @@ uint8_t* BuddySystemSubAllocator::TakeBlock(int c) noexcept {
   if (uint8_t* block = ListPop(c)) return block;
   int k = c + (c >= 1 ? 1 : 2);
   while (k <= fChunkClass && !fFreeLists[k]) ++k;
-  if (k > fChunkClass && fNeedsTidying) {
+  if (k > fChunkClass && HasQuickBlocks()) {
     Tidy();
     if (uint8_t* block = ListPop(c)) return block;
     k = c + (c >= 1 ? 1 : 2);
@@ -421,23 +423,24 @@ void BuddySystemSubAllocator::FreeBlockMerging(uint8_t* block) noexcept {
 }
 
 void* BuddySystemSubAllocator::Allocate(std::size_t size) noexcept {
-  if (HasRemoteFrees()) [[unlikely]]
-    DrainRemoteFrees();
-  // 1 to kQuickSizeLimit bytes: the class is one index lookup away, and a
-  // block freed earlier in that class is usually waiting on its quick list.
-  if (size - 1 < kQuickSizeLimit) [[likely]] {
+  // 1 to kQuickSizeLimit bytes with nothing to drain: the class is one index
+  // lookup away, and a block freed earlier in that class is usually waiting
+  // on its quick list. Everything else is out of line, so that this path
+  // saves no registers.
+  if (size - 1 < kQuickSizeLimit && !HasRemoteFrees()) [[likely]] {
     const std::size_t rounded = (size + 3) & ~std::size_t{3};
     const int c = kClasses.small[(rounded + kPrefixBytes + kBlockHeaderBytes) / 4];
-    uint8_t* block = fQuick[c];
-    if (block) [[likely]] {
+    if (uint8_t* block = fQuick[c]) [[likely]] {
       fQuick[c] = NextOf(block);
       --fQuickCount[c];
-    } else {
-      block = TakeBlock(c);
-      if (!block) return nullptr;
+      return HandOut(block, c, rounded);
     }
-    return HandOut(block, c, rounded);
   }
+  return AllocateSlow(size);
+}
+
+[[gnu::noinline]] void* BuddySystemSubAllocator::AllocateSlow(std::size_t size) noexcept {
+  if (HasRemoteFrees()) DrainRemoteFrees();
   if (size == 0) size = 1;
   if (size > (std::size_t{1} << 48)) return nullptr;
   const std::size_t rounded = (size + 3) & ~std::size_t{3};
@@ -454,16 +457,15 @@ inline void* BuddySystemSubAllocator::HandOut(uint8_t* block, int c, std::size_t
                      static_cast<uint32_t>(rounded / 4) << 16);
   StoreOwner(block + 4, this);
   Store32(block + 12, kBuddyMagic);
-  uint8_t* user = block + 16;
-  if (HeaderClean(h)) [[unlikely]] {
-    std::memset(user, 0, 8);  // PrevOf's link; the rest is zero already
-  } else {
-    ZeroUserArea(user, rounded);
-  }
   Add(bytesInUse, static_cast<int64_t>(kClasses.sizes[c]));
   Add(logicalBytes, static_cast<int64_t>(rounded));
   Add(blocks, 1);
-  return user;
+  uint8_t* user = block + 16;
+  if (HeaderClean(h)) [[unlikely]] {
+    std::memset(user, 0, 8);  // PrevOf's link; the rest is zero already
+    return user;
+  }
+  return ZeroUserArea(user, rounded);
 }
 
 void* BuddySystemSubAllocator::AllocateLarge(std::size_t rounded) noexcept {
@@ -514,11 +516,10 @@ inline void BuddySystemSubAllocator::FreeBuddyLocal(uint8_t* user) noexcept {
   Add(logicalBytes, -static_cast<int64_t>(HeaderLogical(h)));
   Add(blocks, -1);
   if (fQuickCount[c] < kClasses.quickCap[c]) [[likely]] {
-    Store32(block, MakeHeader(c, false, HeaderSide(h), HeaderMemory(h)));
+    // The header keeps reading as in use (HandOut rewrites it whole).
     NextOf(block) = fQuick[c];
     fQuick[c] = block;
     ++fQuickCount[c];
-    fNeedsTidying = true;
     return;
   }
   Store32(block, MakeHeader(c, true, HeaderSide(h), HeaderMemory(h)));
@@ -797,17 +798,21 @@ void* HydraAllocator::Allocate(std::size_t size) noexcept {
 void HydraAllocator::Deallocate(void* p) noexcept {
   // The common case first: a buddy block of the calling thread (a buddy
   // block's magic sits right before the user memory; a page-aligned pointer
-  // needs the readability check below).
+  // needs the readability check of the general case).
   auto* u = static_cast<uint8_t*>(p);
   BuddySystemSubAllocator* self = tCurrent;
-  if ((reinterpret_cast<uintptr_t>(u) & 4095) != 0 && self) [[likely]] {
-    if (Peek32(u - 4) == kBuddyMagic && LoadOwner(u - 12) == self) [[likely]] {
-      self->FreeBuddyLocal(u);
-      if (self->HasRemoteFrees()) [[unlikely]]
-        self->DrainRemoteFrees();
-      return;
-    }
+  if ((reinterpret_cast<uintptr_t>(u) & 4095) != 0 && self && Peek32(u - 4) == kBuddyMagic &&
+      LoadOwner(u - 12) == self) [[likely]] {
+    self->FreeBuddyLocal(u);
+    if (self->HasRemoteFrees()) [[unlikely]]
+      self->DrainRemoteFrees();
+    return;
   }
+  DeallocateSlow(p, self);
+}
+
+[[gnu::noinline]] void HydraAllocator::DeallocateSlow(void* p,
+                                                      BuddySystemSubAllocator* self) noexcept {
   if (!p) return;
   const BlockInfo info = Inspect(p);
   if (info.magic == 0) {

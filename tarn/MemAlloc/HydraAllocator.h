@@ -119,6 +119,8 @@ class HydraAllocator {
   static HydraAllocator& MakeInstance() noexcept;
   BuddySystemSubAllocator* GetSubAllocatorForCurrentThread() noexcept;
   BuddySystemSubAllocator* GetSubAllocatorOrphan() noexcept;
+  // Deallocate's cases other than a buddy block of the calling thread (self).
+  void DeallocateSlow(void* p, BuddySystemSubAllocator* self) noexcept;
 
   // The instance once constructed, read without a call by Instance().
   static inline std::atomic<HydraAllocator*> sInstance{nullptr};

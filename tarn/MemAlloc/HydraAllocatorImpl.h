@@ -216,6 +216,9 @@ class alignas(16) BuddySystemSubAllocator {
   // Writes the header and prefix of a block taken for rounded bytes of class
   // c and zero-fills the user area.
   void* HandOut(uint8_t* block, int c, std::size_t rounded) noexcept;
+  // Allocate's every other case: draining, sizes beyond the quick path,
+  // splitting, growing.
+  void* AllocateSlow(std::size_t size) noexcept;
   void* AllocateLarge(std::size_t rounded) noexcept;
   void FreeLarge(void* user) noexcept;
   [[nodiscard]] uint8_t* TakeBlock(int c) noexcept;
@@ -224,6 +227,7 @@ class alignas(16) BuddySystemSubAllocator {
   void ListRemove(int c, uint8_t* block) noexcept;
   [[nodiscard]] uint8_t* ListPop(int c) noexcept;
   void FreeBlockMerging(uint8_t* block) noexcept;
+  [[nodiscard]] bool HasQuickBlocks() const noexcept;
   // Merges every block waiting on the quick lists.
   void Tidy() noexcept;
   void Add(std::atomic<uint64_t>& figure, int64_t delta) noexcept {
@@ -243,7 +247,6 @@ class alignas(16) BuddySystemSubAllocator {
   // HydraSizeClasses::CachedBlocks(c).
   uint8_t* fQuick[kMaxClasses] = {};
   uint32_t fQuickCount[kMaxClasses] = {};
-  bool fNeedsTidying = false;  // some quick list is non-empty
   // Fully merged chunks (free root blocks, listed) are kept, up to
   // kSpareChunks, instead of being given back, so that a thread whose use
   // swings around a chunk boundary does not take chunks from the pool and
