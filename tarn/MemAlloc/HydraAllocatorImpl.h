@@ -242,7 +242,7 @@ class alignas(16) BuddySystemSubAllocator {
   // headers still read as in use, so no buddy merges with them). A block
   // freed and allocated again in the same class skips the split and merge
   // steps; the lists are merged (tidied) before the pool grows and when the
-  // sub-allocator is destroyed.
+  // sub-allocator is orphaned or destroyed.
   // Invariant: fQuickCount[c] == length of fQuick[c] <=
   // HydraSizeClasses::CachedBlocks(c).
   uint8_t* fQuick[kMaxClasses] = {};
