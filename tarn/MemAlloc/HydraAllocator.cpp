@@ -20,7 +20,10 @@ struct ClassTable {
   std::array<uint64_t, 255> sizes{};
   int count = 0;
   std::array<uint8_t, 256> small{};
-  std::array<uint32_t, 255> quickCap{};  // up to 32 KB of unmerged blocks, at least 4
+  // Blocks a quick list may hold: 128 KB of blocks up to 1088 bytes (the
+  // classes of requests up to 1 KB, which come and go in the largest
+  // numbers), 32 KB of larger ones, and at least 4.
+  std::array<uint32_t, 255> quickCap{};
 };
 
 constexpr ClassTable MakeClassTable() {
@@ -34,7 +37,7 @@ constexpr ClassTable MakeClassTable() {
     t.sizes[t.count++] = a + b;
   }
   for (int k = 0; k < t.count; ++k) {
-    const uint64_t n = 32'768 / t.sizes[k];
+    const uint64_t n = (t.sizes[k] <= 1088 ? 131'072 : 32'768) / t.sizes[k];
     t.quickCap[k] = n < 4 ? 4 : static_cast<uint32_t>(n);
   }
   for (int i = 0, k = 0; i < 256; ++i) {
@@ -60,6 +63,7 @@ inline int ClassForNeed(uint64_t need) noexcept {
 int HydraSizeClasses::Count() noexcept { return kClasses.count; }
 uint64_t HydraSizeClasses::Size(int k) noexcept { return kClasses.sizes[k]; }
 int HydraSizeClasses::SmallIndex(int i) noexcept { return kClasses.small[i]; }
+uint32_t HydraSizeClasses::CachedBlocks(int k) noexcept { return kClasses.quickCap[k]; }
 int HydraSizeClasses::ClassFor(uint64_t bytes) noexcept {
   if (bytes < 1024) return kClasses.small[(bytes + 3) / 4];
   return ClassForNeed(bytes);
@@ -92,20 +96,17 @@ inline void StoreOwner(uint8_t* at, BuddySystemSubAllocator* o) noexcept {
 // Kept out of line so that the compiler, not knowing the size's bound, calls
 // the C runtime's memset (wide vector stores) rather than the string
 // instructions it picks for a bounded size.
-[[gnu::noinline]] void ZeroWide(uint8_t* p, std::size_t bytes) noexcept {
-  std::memset(p, 0, bytes);
+[[gnu::noinline]] void* ZeroWide(uint8_t* p, std::size_t bytes) noexcept {
+  return std::memset(p, 0, bytes);
 }
 
 // Zero-fills the buddy block's user area p (16-byte aligned) for rounded
 // bytes. Short areas are filled in whole 16-byte units (a block's user area
 // always ends on such a unit: class sizes are multiples of 32) by plain
 // vector stores, which beat both a call and the string instructions.
-inline void ZeroUserArea(uint8_t* p, std::size_t rounded) noexcept {
+inline void* ZeroUserArea(uint8_t* p, std::size_t rounded) noexcept {
 #if defined(__GNUC__)
-  if (rounded > 192) {
-    ZeroWide(p, rounded);
-    return;
-  }
+  if (rounded > 192) return ZeroWide(p, rounded);  // a tail call
   using Unit = long long __attribute__((vector_size(16), may_alias));
   auto* unit = reinterpret_cast<Unit*>(p);
   Unit* const end = unit + (rounded + 15) / 16;
@@ -116,8 +117,9 @@ inline void ZeroUserArea(uint8_t* p, std::size_t rounded) noexcept {
     __asm__("" : : "r"(unit) : "memory");  // keeps the loop from becoming a memset call
   }
   if (unit != end) *unit = zero;
+  return p;
 #else
-  std::memset(p, 0, rounded);
+  return std::memset(p, 0, rounded);
 #endif
 }
 
@@ -299,9 +301,13 @@ static inline bool CanServe(int x, int c) noexcept {
   return x == c || (x == c + 1 && c >= 1) || x >= c + 2;
 }
 
+bool BuddySystemSubAllocator::HasQuickBlocks() const noexcept {
+  for (int c = 0; c <= fChunkClass; ++c)
+    if (fQuick[c]) return true;
+  return false;
+}
+
 void BuddySystemSubAllocator::Tidy() noexcept {
-  if (!fNeedsTidying) return;
-  fNeedsTidying = false;
   for (int c = 0; c <= fChunkClass; ++c) {
     uint8_t* block = fQuick[c];
     fQuick[c] = nullptr;
@@ -316,6 +322,22 @@ void BuddySystemSubAllocator::Tidy() noexcept {
   }
 }
 
+void BuddySystemSubAllocator::BecomeOrphan() noexcept {
+  fSpareLimit = 0;
+  Tidy();
+  for (int c = fSmallestChunkClass; c <= fChunkClass && fSpareChunks != 0; ++c) {
+    uint8_t* block = fFreeLists[c];
+    while (block) {
+      uint8_t* next = NextOf(block);
+      if (HeaderSide(Load32(block)) == kRoot) {
+        ListRemove(c, block);
+        HydraAllocator::GlobalPool().GiveBack(block - 16);
+      }
+      block = next;
+    }
+  }
+}
+
 uint8_t* BuddySystemSubAllocator::TakeBlock(int c) noexcept {
   if (uint8_t* block = fQuick[c]) {
     fQuick[c] = NextOf(block);
@@ -325,7 +347,7 @@ uint8_t* BuddySystemSubAllocator::TakeBlock(int c) noexcept {
   if (uint8_t* block = ListPop(c)) return block;
   int k = c + (c >= 1 ? 1 : 2);
   while (k <= fChunkClass && !fFreeLists[k]) ++k;
-  if (k > fChunkClass && fNeedsTidying) {
+  if (k > fChunkClass && HasQuickBlocks()) {
     Tidy();
     if (uint8_t* block = ListPop(c)) return block;
     k = c + (c >= 1 ? 1 : 2);
@@ -391,7 +413,7 @@ void BuddySystemSubAllocator::FreeBlockMerging(uint8_t* block) noexcept {
     Store32(block, h);
   }
   if (HeaderSide(h) == kRoot) {
-    if (fSpareChunks == kSpareChunks) {
+    if (fSpareChunks >= fSpareLimit) {
       HydraAllocator::GlobalPool().GiveBack(block - 16);
       return;
     }
@@ -401,23 +423,24 @@ void BuddySystemSubAllocator::FreeBlockMerging(uint8_t* block) noexcept {
 }
 
 void* BuddySystemSubAllocator::Allocate(std::size_t size) noexcept {
-  if (HasRemoteFrees()) [[unlikely]]
-    DrainRemoteFrees();
-  // 1 to kQuickSizeLimit bytes: the class is one index lookup away, and a
-  // block freed earlier in that class is usually waiting on its quick list.
-  if (size - 1 < kQuickSizeLimit) [[likely]] {
+  // 1 to kQuickSizeLimit bytes with nothing to drain: the class is one index
+  // lookup away, and a block freed earlier in that class is usually waiting
+  // on its quick list. Everything else is out of line, so that this path
+  // saves no registers.
+  if (size - 1 < kQuickSizeLimit && !HasRemoteFrees()) [[likely]] {
     const std::size_t rounded = (size + 3) & ~std::size_t{3};
     const int c = kClasses.small[(rounded + kPrefixBytes + kBlockHeaderBytes) / 4];
-    uint8_t* block = fQuick[c];
-    if (block) [[likely]] {
+    if (uint8_t* block = fQuick[c]) [[likely]] {
       fQuick[c] = NextOf(block);
       --fQuickCount[c];
-    } else {
-      block = TakeBlock(c);
-      if (!block) return nullptr;
+      return HandOut(block, c, rounded);
     }
-    return HandOut(block, c, rounded);
   }
+  return AllocateSlow(size);
+}
+
+[[gnu::noinline]] void* BuddySystemSubAllocator::AllocateSlow(std::size_t size) noexcept {
+  if (HasRemoteFrees()) DrainRemoteFrees();
   if (size == 0) size = 1;
   if (size > (std::size_t{1} << 48)) return nullptr;
   const std::size_t rounded = (size + 3) & ~std::size_t{3};
@@ -434,16 +457,15 @@ inline void* BuddySystemSubAllocator::HandOut(uint8_t* block, int c, std::size_t
                      static_cast<uint32_t>(rounded / 4) << 16);
   StoreOwner(block + 4, this);
   Store32(block + 12, kBuddyMagic);
-  uint8_t* user = block + 16;
-  if (HeaderClean(h)) [[unlikely]] {
-    std::memset(user, 0, 8);  // PrevOf's link; the rest is zero already
-  } else {
-    ZeroUserArea(user, rounded);
-  }
   Add(bytesInUse, static_cast<int64_t>(kClasses.sizes[c]));
   Add(logicalBytes, static_cast<int64_t>(rounded));
   Add(blocks, 1);
-  return user;
+  uint8_t* user = block + 16;
+  if (HeaderClean(h)) [[unlikely]] {
+    std::memset(user, 0, 8);  // PrevOf's link; the rest is zero already
+    return user;
+  }
+  return ZeroUserArea(user, rounded);
 }
 
 void* BuddySystemSubAllocator::AllocateLarge(std::size_t rounded) noexcept {
@@ -494,11 +516,10 @@ inline void BuddySystemSubAllocator::FreeBuddyLocal(uint8_t* user) noexcept {
   Add(logicalBytes, -static_cast<int64_t>(HeaderLogical(h)));
   Add(blocks, -1);
   if (fQuickCount[c] < kClasses.quickCap[c]) [[likely]] {
-    Store32(block, MakeHeader(c, false, HeaderSide(h), HeaderMemory(h)));
+    // The header keeps reading as in use (HandOut rewrites it whole).
     NextOf(block) = fQuick[c];
     fQuick[c] = block;
     ++fQuickCount[c];
-    fNeedsTidying = true;
     return;
   }
   Store32(block, MakeHeader(c, true, HeaderSide(h), HeaderMemory(h)));
@@ -637,26 +658,24 @@ void HydraGlobalPool::PushOrphan(BuddySystemSubAllocator* orphan) noexcept {
   EnqueueAtomic(&fOrphans, orphan);
 }
 
-BuddySystemSubAllocator* HydraGlobalPool::PopOrphans() noexcept {
-  return static_cast<BuddySystemSubAllocator*>(DetachAtomic(&fOrphans));
-}
-
 void HydraGlobalPool::CollectOrphans() noexcept {
-  // Move new orphans onto our own list (the pool thread alone touches it).
+  // Take every orphan, destroy those whose blocks have all come back, and
+  // put the others back on the stack, where a new thread may still adopt
+  // them.
+  BuddySystemSubAllocator* held = nullptr;
   while (BuddySystemSubAllocator* orphan = HydraAllocator::Instance().GetSubAllocatorOrphan()) {
-    orphan->next = fHeldOrphans;
-    fHeldOrphans = orphan;
+    orphan->next = held;
+    held = orphan;
   }
-  BuddySystemSubAllocator** link = &fHeldOrphans;
-  while (BuddySystemSubAllocator* orphan = *link) {
+  while (BuddySystemSubAllocator* orphan = held) {
+    held = orphan->next;
     orphan->DrainRemoteFrees();
     if (orphan->HoldsLiveBlocks()) {
-      link = &orphan->next;
-      continue;
+      EnqueueAtomic(&fOrphans, orphan);
+    } else {
+      BuddySystemSubAllocator::Destroy(orphan);
+      fOrphanCount.fetch_sub(1);
     }
-    *link = orphan->next;
-    BuddySystemSubAllocator::Destroy(orphan);
-    fOrphanCount.fetch_sub(1);
   }
 }
 
@@ -724,7 +743,20 @@ void HydraAllocator::SetIgnoreUnknownDeallocations(bool ignore) noexcept {
 
 BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorForCurrentThread() noexcept {
   if (BuddySystemSubAllocator* s = tCurrent) return s;
-  BuddySystemSubAllocator* s = BuddySystemSubAllocator::Create();
+  // A new thread takes over an orphan, if there is one: the blocks the
+  // orphan still has out are then freed by its new owner as they come back,
+  // not up to half a second later by the pool thread, and its chunks serve
+  // the new thread at once. Programs
+  // that start a thread per task keep a handful of sub-allocators instead
+  // of one per recently ended thread.
+  BuddySystemSubAllocator* s = GetSubAllocatorOrphan();
+  if (s) {
+    s->next = nullptr;
+    s->BecomeAdopted();
+    fPool->fOrphanCount.fetch_sub(1);
+  } else {
+    s = BuddySystemSubAllocator::Create();
+  }
   if (!s) return nullptr;
   hydra_os::SetThreadKey(s);
   tCurrent = s;
@@ -732,9 +764,14 @@ BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorForCurrentThread() noexc
 }
 
 BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorOrphan() noexcept {
-  // Only the pool thread pops orphans (and only it destroys them), so a
-  // popped node is never freed while another pop reads its link.
-  return static_cast<BuddySystemSubAllocator*>(DequeueAtomic(&fPool->fOrphans));
+  // Pops are serialized: a popped orphan may be destroyed (by the pool
+  // thread, or by its adopter's thread ending), so no other pop may still be
+  // reading its link. Pushes need no lock.
+  while (fPool->fOrphanPopLock.test_and_set(std::memory_order_acquire))
+    hydra_os::SleepMilliseconds(0);
+  void* orphan = DequeueAtomic(&fPool->fOrphans);
+  fPool->fOrphanPopLock.clear(std::memory_order_release);
+  return static_cast<BuddySystemSubAllocator*>(orphan);
 }
 
 void HydraAllocator::SubAllocatorDestructor(void* subAllocator) noexcept {
@@ -742,9 +779,10 @@ void HydraAllocator::SubAllocatorDestructor(void* subAllocator) noexcept {
   if (!s) return;
   if (tCurrent == s) tCurrent = nullptr;
   s->DrainRemoteFrees();
-  if (s->HoldsLiveBlocks())
+  if (s->HoldsLiveBlocks()) {
+    s->BecomeOrphan();
     GlobalPool().PushOrphan(s);
-  else
+  } else
     BuddySystemSubAllocator::Destroy(s);
 }
 
@@ -760,17 +798,21 @@ void* HydraAllocator::Allocate(std::size_t size) noexcept {
 void HydraAllocator::Deallocate(void* p) noexcept {
   // The common case first: a buddy block of the calling thread (a buddy
   // block's magic sits right before the user memory; a page-aligned pointer
-  // needs the readability check below).
+  // needs the readability check of the general case).
   auto* u = static_cast<uint8_t*>(p);
   BuddySystemSubAllocator* self = tCurrent;
-  if ((reinterpret_cast<uintptr_t>(u) & 4095) != 0 && self) [[likely]] {
-    if (Peek32(u - 4) == kBuddyMagic && LoadOwner(u - 12) == self) [[likely]] {
-      self->FreeBuddyLocal(u);
-      if (self->HasRemoteFrees()) [[unlikely]]
-        self->DrainRemoteFrees();
-      return;
-    }
+  if ((reinterpret_cast<uintptr_t>(u) & 4095) != 0 && self && Peek32(u - 4) == kBuddyMagic &&
+      LoadOwner(u - 12) == self) [[likely]] {
+    self->FreeBuddyLocal(u);
+    if (self->HasRemoteFrees()) [[unlikely]]
+      self->DrainRemoteFrees();
+    return;
   }
+  DeallocateSlow(p, self);
+}
+
+[[gnu::noinline]] void HydraAllocator::DeallocateSlow(void* p,
+                                                      BuddySystemSubAllocator* self) noexcept {
   if (!p) return;
   const BlockInfo info = Inspect(p);
   if (info.magic == 0) {

@@ -12,9 +12,13 @@
 // bytes come from a process-wide pool of pre-allocated 53,232-byte chunks,
 // kept between 256 and 275 chunks by a background thread that wakes every
 // 100 ms; that thread also collects the sub-allocators of ended threads
-// (orphans) once their last block has been freed elsewhere. For reuse, each
-// thread keeps up to eight free chunks and up to 32 KB of freed blocks per
-// size class; they go back to the pool when the thread ends.
+// (orphans) once their last block has been freed elsewhere, unless a new
+// thread has taken one over first (a thread's first allocation adopts a
+// recent orphan when there is one, instead of creating a sub-allocator).
+// For reuse, each thread keeps up to eight free chunks and a bounded number
+// of freed blocks per size class (HydraSizeClasses::CachedBlocks); they go
+// back to the pool when the thread ends, and an orphan gives back each chunk
+// as soon as it is free.
 //
 // What callers may rely on:
 // - Every block is zero-filled and 16-byte aligned (the prefix in front of
@@ -59,6 +63,10 @@ inline constexpr std::size_t kPooledChunkBytes = 53'232;  // size of every poole
 // Entry i of the small-size index (0 <= i < 256): the smallest class of at
 // least 4 * i bytes.
 [[nodiscard]] int SmallIndex(int i) noexcept;
+// How many freed blocks of class k a thread keeps unmerged for reuse
+// (128 KB of blocks up to 1088 bytes, 32 KB of larger ones, at least 4);
+// a block freed beyond that is merged with its buddies at once.
+[[nodiscard]] uint32_t CachedBlocks(int k) noexcept;
 // The smallest class of at least bytes bytes; -1 when none is that large.
 [[nodiscard]] int ClassFor(uint64_t bytes) noexcept;
 }  // namespace HydraSizeClasses
@@ -111,6 +119,8 @@ class HydraAllocator {
   static HydraAllocator& MakeInstance() noexcept;
   BuddySystemSubAllocator* GetSubAllocatorForCurrentThread() noexcept;
   BuddySystemSubAllocator* GetSubAllocatorOrphan() noexcept;
+  // Deallocate's cases other than a buddy block of the calling thread (self).
+  void DeallocateSlow(void* p, BuddySystemSubAllocator* self) noexcept;
 
   // The instance once constructed, read without a call by Instance().
   static inline std::atomic<HydraAllocator*> sInstance{nullptr};

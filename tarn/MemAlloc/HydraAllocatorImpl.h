@@ -75,7 +75,6 @@ class HydraGlobalPool {
   void GiveBack(void* chunk) noexcept;
 
   void PushOrphan(BuddySystemSubAllocator* orphan) noexcept;
-  [[nodiscard]] BuddySystemSubAllocator* PopOrphans() noexcept;  // the whole chain
 
   // Starts the pool thread (once).
   void StartPoolThread() noexcept;
@@ -115,7 +114,10 @@ class HydraGlobalPool {
   std::atomic<uint64_t> fOrphanCount{0};
   std::atomic<bool> fThreadStarted{false};
   std::atomic_flag fNodeBatchLock = ATOMIC_FLAG_INIT;
-  BuddySystemSubAllocator* fHeldOrphans = nullptr;  // pool thread only
+  // Held for each pop of fOrphans (the pool thread's, and a new thread's
+  // adopting an orphan), so that no pop reads the link of an orphan that
+  // another popper took and destroyed.
+  std::atomic_flag fOrphanPopLock = ATOMIC_FLAG_INIT;
 };
 
 // ---- The per-thread buddy pool -----------------------------------------
@@ -189,6 +191,13 @@ class alignas(16) BuddySystemSubAllocator {
   }
   // Usable bytes of a block of this allocator or a large block.
   [[nodiscard]] static std::size_t Capacity(void* user) noexcept;
+  // As its thread ends while blocks are still live: merges the quick lists
+  // and gives every fully merged chunk back, and from then on gives back
+  // each chunk as soon as it is fully merged, so that an orphan holds no
+  // more than its live blocks need.
+  void BecomeOrphan() noexcept;
+  // Taken over by a new thread: keeps spare chunks again.
+  void BecomeAdopted() noexcept { fSpareLimit = kSpareChunks; }
 
   // Figures, written only by the owning thread, read by anyone.
   std::atomic<uint64_t> bytesInUse{0};
@@ -207,6 +216,9 @@ class alignas(16) BuddySystemSubAllocator {
   // Writes the header and prefix of a block taken for rounded bytes of class
   // c and zero-fills the user area.
   void* HandOut(uint8_t* block, int c, std::size_t rounded) noexcept;
+  // Allocate's every other case: draining, sizes beyond the quick path,
+  // splitting, growing.
+  void* AllocateSlow(std::size_t size) noexcept;
   void* AllocateLarge(std::size_t rounded) noexcept;
   void FreeLarge(void* user) noexcept;
   [[nodiscard]] uint8_t* TakeBlock(int c) noexcept;
@@ -215,6 +227,7 @@ class alignas(16) BuddySystemSubAllocator {
   void ListRemove(int c, uint8_t* block) noexcept;
   [[nodiscard]] uint8_t* ListPop(int c) noexcept;
   void FreeBlockMerging(uint8_t* block) noexcept;
+  [[nodiscard]] bool HasQuickBlocks() const noexcept;
   // Merges every block waiting on the quick lists.
   void Tidy() noexcept;
   void Add(std::atomic<uint64_t>& figure, int64_t delta) noexcept {
@@ -229,19 +242,20 @@ class alignas(16) BuddySystemSubAllocator {
   // headers still read as in use, so no buddy merges with them). A block
   // freed and allocated again in the same class skips the split and merge
   // steps; the lists are merged (tidied) before the pool grows and when the
-  // sub-allocator is destroyed.
-  // Invariant: fQuickCount[c] == length of fQuick[c] <= the class's cap
-  // (32 KB of blocks, at least 4).
+  // sub-allocator is orphaned or destroyed.
+  // Invariant: fQuickCount[c] == length of fQuick[c] <=
+  // HydraSizeClasses::CachedBlocks(c).
   uint8_t* fQuick[kMaxClasses] = {};
   uint32_t fQuickCount[kMaxClasses] = {};
-  bool fNeedsTidying = false;  // some quick list is non-empty
   // Fully merged chunks (free root blocks, listed) are kept, up to
   // kSpareChunks, instead of being given back, so that a thread whose use
   // swings around a chunk boundary does not take chunks from the pool and
   // give them back all the time.
-  // Invariant: fSpareChunks == number of root blocks on the free lists.
+  // Invariant: fSpareChunks == number of root blocks on the free lists
+  // <= fSpareLimit (kSpareChunks, or 0 while orphaned).
   static constexpr uint32_t kSpareChunks = 8;
   uint32_t fSpareChunks = 0;
+  uint32_t fSpareLimit = kSpareChunks;
   uint64_t fLargeBlocks = 0;  // live blocks taken from the pool directly
 };
 

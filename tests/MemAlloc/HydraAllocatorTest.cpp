@@ -65,6 +65,11 @@ TEST(HydraSizeClasses, SmallIndexEveryEntry) {
   EXPECT_EQ(ClassFor(1089), 8);
   EXPECT_EQ(ClassFor(51104), 15);
   EXPECT_EQ(ClassFor(51105), 16);
+  // Freed blocks cached per class: 128 KB up to 1088 bytes, 32 KB beyond,
+  // at least 4.
+  const std::pair<int, uint32_t> cached[] = {{0, 4096}, {5, 315}, {7, 120}, {8, 18},
+                                             {11, 4},   {12, 4},  {15, 4}};
+  for (auto [k, n] : cached) EXPECT_EQ(CachedBlocks(k), n) << k;
 }
 
 TEST(HydraAllocator, BuddyPrefixAndLargePrefix) {
@@ -193,6 +198,59 @@ TEST(HydraAllocator, SplitsAndMergesBackToWholeChunks) {
   EXPECT_EQ(HydraDebugging::BytesInUseInOperatorNewPools(), inUse);
 }
 
+// Freed blocks wait on a per-class cache of CachedBlocks(k) blocks for
+// reuse; any beyond it are merged at once. On a fresh thread, n = cap + 8
+// blocks of a class are written full and freed (on the thread itself, or on
+// another thread and then drained in the reverse order of their pushes):
+// the next cap allocations of the class are exactly the cached blocks, last
+// cached first, each zero-filled again, and the figures return to where
+// they started.
+TEST(HydraAllocator, FreedBlockCacheIsBoundedZeroFilledAndCounted) {
+  struct Case {
+    int k;
+    bool freedElsewhere;
+  };
+  const Case cases[] = {{0, false}, {4, false}, {7, false}, {9, false}, {13, false},
+                        {0, true},  {5, true},  {7, true},  {11, true}};
+  for (const Case& c : cases) {
+    const std::size_t size = Size(c.k) - 20;  // the largest request of class k
+    const std::size_t cap = CachedBlocks(c.k);
+    std::vector<void*> b(cap + 8), again(cap);
+    std::atomic<int> step{0};
+    std::thread owner([&] {
+      const uint64_t blocks = HydraDebugging::BlocksInOperatorNewPools();
+      const uint64_t inUse = HydraDebugging::BytesInUseInOperatorNewPools();
+      for (void*& p : b) std::memset(p = Heap().Allocate(size), 0xAB, size);
+      if (c.freedElsewhere) {
+        step = 1;  // the test's thread frees them now
+        while (step.load() != 2) std::this_thread::yield();
+      } else {
+        for (void* p : b) Heap().Deallocate(p);
+      }
+      // (The figures first drain this thread's pending frees.)
+      EXPECT_EQ(HydraDebugging::BlocksInOperatorNewPools(), blocks);
+      EXPECT_EQ(HydraDebugging::BytesInUseInOperatorNewPools(), inUse);
+      for (std::size_t i = 0; i < cap; ++i) {
+        again[i] = Heap().Allocate(size);
+        const void* cached = c.freedElsewhere ? b[b.size() - cap + i] : b[cap - 1 - i];
+        ASSERT_EQ(again[i], cached) << "class " << c.k << " block " << i;
+        ASSERT_TRUE(AllZero(again[i], size)) << "class " << c.k << " block " << i;
+      }
+      EXPECT_EQ(HydraDebugging::BlocksInOperatorNewPools(), blocks + cap);
+      EXPECT_EQ(HydraDebugging::BytesInUseInOperatorNewPools(), inUse + cap * Size(c.k));
+      for (void* p : again) Heap().Deallocate(p);
+      EXPECT_EQ(HydraDebugging::BlocksInOperatorNewPools(), blocks);
+      EXPECT_EQ(HydraDebugging::BytesInUseInOperatorNewPools(), inUse);
+    });
+    if (c.freedElsewhere) {
+      while (step.load() != 1) std::this_thread::yield();
+      for (void* p : b) Heap().Deallocate(p);
+      step = 2;
+    }
+    owner.join();
+  }
+}
+
 TEST(HydraAllocator, ReallocateKeepsContentsAndZeroesNewBytes) {
   EXPECT_EQ(Heap().Reallocate(Heap().Allocate(8), 0), nullptr);
   // Grow and shrink across buddy classes and into and out of large chunks.
@@ -276,6 +334,34 @@ TEST(HydraAllocator, OrphanCollectedAfterLastBlockFreed) {
   EXPECT_EQ(HydraDebugging::OrphanedSubAllocators(), 0u);
   // Within about half a second (with room for a loaded machine).
   EXPECT_LT(std::chrono::steady_clock::now() - freedAt, std::chrono::seconds(2));
+}
+
+// A thread's first allocation takes over a waiting orphan: the new
+// thread's blocks carry the orphan as owner, the orphan count drops, and the
+// orphan's block freed elsewhere goes back to its new owner. (The pool
+// thread takes the orphans off their stack for a moment every 500 ms; an
+// attempt that falls into that moment is inconclusive, so it retries.)
+TEST(HydraAllocator, NewThreadAdoptsRecentOrphan) {
+  bool adopted = false;
+  for (int attempt = 0; attempt < 5 && !adopted; ++attempt) {
+    const uint64_t orphans = HydraDebugging::OrphanedSubAllocators();
+    void* kept = nullptr;
+    std::thread([&] { kept = Heap().Allocate(500); }).join();
+    ASSERT_EQ(HydraDebugging::OrphanedSubAllocators(), orphans + 1);
+    uint64_t ownerOnNew = 0, orphansWhileNew = 0;
+    std::thread([&] {
+      void* onNew = Heap().Allocate(500);
+      ownerOnNew = Word64(onNew, -12);
+      orphansWhileNew = HydraDebugging::OrphanedSubAllocators();
+      Heap().Deallocate(onNew);
+    }).join();
+    adopted = ownerOnNew == Word64(kept, -12);
+    if (adopted) {
+      EXPECT_EQ(orphansWhileNew, orphans);
+    }
+    Heap().Deallocate(kept);
+  }
+  EXPECT_TRUE(adopted);
 }
 
 TEST(HydraAllocator, IgnoreUnknownDeallocationsFlag) {
