@@ -218,6 +218,10 @@ TEST(HydraAllocator, FreedBlockCacheIsBoundedZeroFilledAndCounted) {
     std::vector<void*> b(cap + 8), again(cap);
     std::atomic<int> step{0};
     std::thread owner([&] {
+      // The first allocation may adopt an orphan of an earlier test, whose
+      // pending frees the first figures drain: the baseline comes after.
+      Heap().Deallocate(Heap().Allocate(1));
+      (void)HydraDebugging::BlocksInOperatorNewPools();
       const uint64_t blocks = HydraDebugging::BlocksInOperatorNewPools();
       const uint64_t inUse = HydraDebugging::BytesInUseInOperatorNewPools();
       for (void*& p : b) std::memset(p = Heap().Allocate(size), 0xAB, size);
@@ -344,10 +348,11 @@ TEST(HydraAllocator, OrphanCollectedAfterLastBlockFreed) {
 TEST(HydraAllocator, NewThreadAdoptsRecentOrphan) {
   bool adopted = false;
   for (int attempt = 0; attempt < 5 && !adopted; ++attempt) {
-    const uint64_t orphans = HydraDebugging::OrphanedSubAllocators();
     void* kept = nullptr;
+    // (This thread may itself adopt an orphan an earlier test left behind.)
     std::thread([&] { kept = Heap().Allocate(500); }).join();
-    ASSERT_EQ(HydraDebugging::OrphanedSubAllocators(), orphans + 1);
+    const uint64_t orphans = HydraDebugging::OrphanedSubAllocators();  // kept's owner among them
+    EXPECT_GE(orphans, 1u);
     uint64_t ownerOnNew = 0, orphansWhileNew = 0;
     std::thread([&] {
       void* onNew = Heap().Allocate(500);
@@ -357,7 +362,7 @@ TEST(HydraAllocator, NewThreadAdoptsRecentOrphan) {
     }).join();
     adopted = ownerOnNew == Word64(kept, -12);
     if (adopted) {
-      EXPECT_EQ(orphansWhileNew, orphans);
+      EXPECT_EQ(orphansWhileNew, orphans - 1);
     }
     Heap().Deallocate(kept);
   }
