@@ -5,16 +5,13 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <climits>
 #include <cstdint>
 #include <cstring>
-#include <filesystem>
 #include <future>
 #include <memory>
-#include <random>
-#include <string>
 #include <vector>
 
+#include "TestSupport.h"
 #include "tarn/Audio/AsyncAudioReader.h"
 #include "tarn/Audio/InterAudioWriter.h"
 #include "tarn/Errors/Fail.h"
@@ -23,36 +20,6 @@
 #include "tarn/String/UString.h"
 
 namespace tarn::test {
-
-using Bytes = std::vector<std::uint8_t>;
-
-// The OS-style error code that f throws, 0 when it returns, INT_MIN for others.
-template <typename F>
-int ErrorOf(F&& f) try {
-  return f(), 0;
-} catch (const TarnError& e) {
-  return e.IsMacOSError() ? e.GetIntErrorCode() : INT_MIN;
-}
-
-inline FileSpecification Spec(const std::filesystem::path& p) {
-  return FileSpecification(UString(p.string()));
-}
-
-// A scratch folder removed with everything in it.
-struct ScratchDir {
-  ScratchDir() {
-    path = std::filesystem::temp_directory_path() /
-           ("tarn-audiochain-" + std::to_string(std::random_device{}()));
-    std::filesystem::create_directories(path);
-  }
-  ScratchDir(const ScratchDir&) = delete;
-  ScratchDir& operator=(const ScratchDir&) = delete;
-  ~ScratchDir() {
-    std::error_code ec;
-    std::filesystem::remove_all(path, ec);
-  }
-  std::filesystem::path path;
-};
 
 inline AudioFormat Format(SampleFormat f, int channels, double rate = 48000.0) {
   AudioFormat a;

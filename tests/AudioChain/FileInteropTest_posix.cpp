@@ -26,26 +26,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-// The standard output of `command`; fails the test when it exits non-zero.
-std::string RunTool(const std::string& command) {
-  std::string out;
-  FILE* pipe = ::popen((command + " 2>/dev/null").c_str(), "r");
-  if (pipe == nullptr) {
-    ADD_FAILURE() << "cannot run " << command;
-    return out;
-  }
-  std::array<char, 65536> buffer;
-  std::size_t n = 0;
-  while ((n = std::fread(buffer.data(), 1, buffer.size(), pipe)) > 0) out.append(buffer.data(), n);
-  EXPECT_EQ(::pclose(pipe), 0) << command;
-  return out;
-}
-
-void Need(const char* tool, const char* package) {
-  const int status = std::system((std::string("command -v ") + tool + " >/dev/null 2>&1").c_str());
-  ASSERT_EQ(status, 0) << tool << " is missing: install the Debian package " << package;
-}
-
 // Interleaved float samples and channel count as libsndfile decodes a file.
 struct Decoded {
   int channels = 0;
@@ -104,7 +84,7 @@ Decoded Reference(const fs::path& path, SampleFormat format, int channels) {
 
 // Reads the whole file through the facade, interleaved back for comparing.
 std::vector<float> ReadWithChain(const fs::path& path, int& channels) {
-  SoundFileReader file(Spec(path));
+  SoundFileReader file(SpecOf(path));
   channels = file.GetNumChannels();
   std::vector<std::vector<float>> per;
   EXPECT_EQ(file.Read(0, file.GetLengthInFrames(), per), file.GetLengthInFrames());
@@ -117,11 +97,11 @@ std::vector<float> ReadWithChain(const fs::path& path, int& channels) {
 class FileInterop : public ::testing::Test {
  protected:
   void SetUp() override {
-    Need("sox", "sox");
-    Need("ffmpeg", "ffmpeg");
-    Need("sndfile-convert", "sndfile-programs");
+    NeedTool("sox", "sox");
+    NeedTool("ffmpeg", "ffmpeg");
+    NeedTool("sndfile-convert", "sndfile-programs");
   }
-  ScratchDir dir;
+  TempDir dir;
 };
 
 // Sine tones of different pitches per channel plus noise, so channels and
@@ -265,7 +245,7 @@ TEST_F(FileInterop, WrittenFilesDecodeToTheSamplesWritten) {
           settings.numChannels = static_cast<std::int16_t>(channels);
           settings.sampleRate = 44100.0;
           settings.fileFormat = c.format;
-          SoundFileWriter out(Spec(path), settings);
+          SoundFileWriter out(SpecOf(path), settings);
           if (perChannel) {
             std::vector<std::vector<float>> per(static_cast<std::size_t>(channels));
             for (std::int64_t i = 0; i < kFrames; ++i)
@@ -320,7 +300,7 @@ TEST_F(FileInterop, RecoveryLeavesTrailingChunksAndRepairsForeignFiles) {
       "-write_id3v2 1 -metadata title=take '" +
       tagged.string() + "'");
   const std::string before = RunTool("cat '" + tagged.string() + "'");
-  SoundFileWriter::RecoverCrashedRecording(Spec(tagged));
+  SoundFileWriter::RecoverCrashedRecording(SpecOf(tagged));
   EXPECT_EQ(RunTool("cat '" + tagged.string() + "'"), before);
 
   // sox's AIFF and AIFC files with audio appended after their header was
@@ -333,7 +313,7 @@ TEST_F(FileInterop, RecoveryLeavesTrailingChunksAndRepairsForeignFiles) {
     // Cut the header's counts back to a quarter of the audio, as a
     // recorder that died after its first flush leaves them.
     {
-      SoundFileReader file(Spec(path));
+      SoundFileReader file(SpecOf(path));
       auto format = file.GetFileFormat();
       auto access = format->GetReadWriteMetaDataAccess();
       const std::string save = RunTool("cat '" + path.string() + "'");
@@ -344,7 +324,7 @@ TEST_F(FileInterop, RecoveryLeavesTrailingChunksAndRepairsForeignFiles) {
                  static_cast<std::streamsize>(save.size() - fs::file_size(path)));
     }
     ASSERT_EQ(DecodeWithLibsndfile(path).samples.size(), whole.samples.size() / 4);
-    SoundFileWriter::RecoverCrashedRecording(Spec(path));
+    SoundFileWriter::RecoverCrashedRecording(SpecOf(path));
     EXPECT_EQ(DecodeWithLibsndfile(path).samples, whole.samples);
   }
 }
