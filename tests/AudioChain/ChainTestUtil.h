@@ -11,6 +11,7 @@
 #include <memory>
 #include <vector>
 
+#include "Audio/AudioTestUtil.h"
 #include "TestSupport.h"
 #include "tarn/Audio/AsyncAudioReader.h"
 #include "tarn/Audio/InterAudioWriter.h"
@@ -186,33 +187,15 @@ inline std::vector<SampleCase> SampleTable(SampleFormat f) {
   }
 }
 
-// The float table's samples (-1.0, 1.0, 0.0, 1.5, -0.25) in each format:
-// full scale clips, -1.0 is the most negative value, the 8-bit offset form
-// is shifted by 128, and a negative 24-bit result that is not whole moves
-// down one more step (-0.25 is 0xDFFFFF00).
-struct FloatCase {
-  SampleFormat to;
-  std::vector<Bytes> expected;
-};
-inline const FloatCase kFromFloat[] = {
-    {kSamp8Offset, {{0x00}, {0xFF}, {0x80}, {0xFF}, {0x60}}},
-    {kSamp8, {{0x80}, {0x7F}, {0x00}, {0x7F}, {0xE0}}},
-    {kSamp16, {{0x00, 0x80}, {0xFF, 0x7F}, {0x00, 0x00}, {0xFF, 0x7F}, {0x00, 0xE0}}},
-    {kSamp24,
-     {{0x00, 0x00, 0x80}, {0xFF, 0xFF, 0x7F}, {0, 0, 0}, {0xFF, 0xFF, 0x7F}, {0xFF, 0xFF, 0xDF}}},
-    {kSampUnpacked24,
-     {{0, 0, 0, 0x80},
-      {0, 0xFF, 0xFF, 0x7F},
-      {0, 0, 0, 0},
-      {0, 0xFF, 0xFF, 0x7F},
-      {0, 0xFF, 0xFF, 0xDF}}},
-    {kSampFloat32,
-     {{0, 0, 0x80, 0xBF},
-      {0, 0, 0x80, 0x3F},
-      {0, 0, 0, 0},
-      {0, 0, 0xC0, 0x3F},
-      {0, 0, 0x80, 0xBE}}},
-};
+// What the sample converter makes of interleaved `frames` in format `from`,
+// by the audio tests' independent model of it (no dither); the same format
+// is copied.
+inline Bytes Converted(SampleFormat from, SampleFormat to, const Bytes& frames) {
+  return from == to ? frames : convref::ConvertRun(from, to, nullptr, frames);
+}
+// The file formats the chain converts to and from.
+constexpr SampleFormat kConvertible[] = {kSamp8Offset, kSamp8,          kSamp16,
+                                         kSamp24,      kSampUnpacked24, kSampFloat32};
 
 // Interleaved frames whose sample (frame i, channel c) is table entry
 // (i * 3 + c) % size, so neighbouring channels and frames differ.
