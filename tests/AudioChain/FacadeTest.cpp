@@ -161,6 +161,7 @@ TEST(Facade, FlushLeavesACompleteFileAndRecordingsCanOutgrowRIFF) {
       out.Flush();
       SoundFileReader check(SpecOf(path));
       EXPECT_EQ(check.GetLengthInFrames(), 300 * k);
+      EXPECT_EQ(out.GetFramesWritten(), 300 * k);
     }
     // A WAVE recording may grow to Wave64's limit: its format switches it
     // in place when RIFF's sizes run out.
