@@ -16,19 +16,12 @@
 #include <tuple>
 #include <vector>
 
+#include "TestSupport.h"
 #include "tarn/Audio/BufConverter.h"
 #include "tarn/Audio/ConverterKernelsImpl.h"
 #include "tarn/Audio/Dither.h"
 #include "tarn/Errors/TarnError.h"
 #include "tarn/Time/TarnSystemTime.h"
-
-// The OS-style error code that f throws, 0 when it returns, INT_MIN for others.
-template <typename F>
-int ErrorOf(F&& f) try {
-  return f(), 0;
-} catch (const tarn::TarnError& e) {
-  return e.IsMacOSError() ? e.GetIntErrorCode() : INT_MIN;
-}
 
 namespace convref {
 

@@ -5,16 +5,14 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <climits>
 #include <cstdint>
 #include <cstring>
-#include <filesystem>
 #include <future>
 #include <memory>
-#include <random>
-#include <string>
 #include <vector>
 
+#include "Audio/AudioTestUtil.h"
+#include "TestSupport.h"
 #include "tarn/Audio/AsyncAudioReader.h"
 #include "tarn/Audio/InterAudioWriter.h"
 #include "tarn/Errors/Fail.h"
@@ -23,36 +21,6 @@
 #include "tarn/String/UString.h"
 
 namespace tarn::test {
-
-using Bytes = std::vector<std::uint8_t>;
-
-// The OS-style error code that f throws, 0 when it returns, INT_MIN for others.
-template <typename F>
-int ErrorOf(F&& f) try {
-  return f(), 0;
-} catch (const TarnError& e) {
-  return e.IsMacOSError() ? e.GetIntErrorCode() : INT_MIN;
-}
-
-inline FileSpecification Spec(const std::filesystem::path& p) {
-  return FileSpecification(UString(p.string()));
-}
-
-// A scratch folder removed with everything in it.
-struct ScratchDir {
-  ScratchDir() {
-    path = std::filesystem::temp_directory_path() /
-           ("tarn-audiochain-" + std::to_string(std::random_device{}()));
-    std::filesystem::create_directories(path);
-  }
-  ScratchDir(const ScratchDir&) = delete;
-  ScratchDir& operator=(const ScratchDir&) = delete;
-  ~ScratchDir() {
-    std::error_code ec;
-    std::filesystem::remove_all(path, ec);
-  }
-  std::filesystem::path path;
-};
 
 inline AudioFormat Format(SampleFormat f, int channels, double rate = 48000.0) {
   AudioFormat a;
@@ -219,33 +187,15 @@ inline std::vector<SampleCase> SampleTable(SampleFormat f) {
   }
 }
 
-// The float table's samples (-1.0, 1.0, 0.0, 1.5, -0.25) in each format:
-// full scale clips, -1.0 is the most negative value, the 8-bit offset form
-// is shifted by 128, and a negative 24-bit result that is not whole moves
-// down one more step (-0.25 is 0xDFFFFF00).
-struct FloatCase {
-  SampleFormat to;
-  std::vector<Bytes> expected;
-};
-inline const FloatCase kFromFloat[] = {
-    {kSamp8Offset, {{0x00}, {0xFF}, {0x80}, {0xFF}, {0x60}}},
-    {kSamp8, {{0x80}, {0x7F}, {0x00}, {0x7F}, {0xE0}}},
-    {kSamp16, {{0x00, 0x80}, {0xFF, 0x7F}, {0x00, 0x00}, {0xFF, 0x7F}, {0x00, 0xE0}}},
-    {kSamp24,
-     {{0x00, 0x00, 0x80}, {0xFF, 0xFF, 0x7F}, {0, 0, 0}, {0xFF, 0xFF, 0x7F}, {0xFF, 0xFF, 0xDF}}},
-    {kSampUnpacked24,
-     {{0, 0, 0, 0x80},
-      {0, 0xFF, 0xFF, 0x7F},
-      {0, 0, 0, 0},
-      {0, 0xFF, 0xFF, 0x7F},
-      {0, 0xFF, 0xFF, 0xDF}}},
-    {kSampFloat32,
-     {{0, 0, 0x80, 0xBF},
-      {0, 0, 0x80, 0x3F},
-      {0, 0, 0, 0},
-      {0, 0, 0xC0, 0x3F},
-      {0, 0, 0x80, 0xBE}}},
-};
+// What the sample converter makes of interleaved `frames` in format `from`,
+// by the audio tests' independent model of it (no dither); the same format
+// is copied.
+inline Bytes Converted(SampleFormat from, SampleFormat to, const Bytes& frames) {
+  return from == to ? frames : convref::ConvertRun(from, to, nullptr, frames);
+}
+// The file formats the chain converts to and from.
+constexpr SampleFormat kConvertible[] = {kSamp8Offset, kSamp8,          kSamp16,
+                                         kSamp24,      kSampUnpacked24, kSampFloat32};
 
 // Interleaved frames whose sample (frame i, channel c) is table entry
 // (i * 3 + c) % size, so neighbouring channels and frames differ.

@@ -47,7 +47,7 @@ fs::path Write16(const fs::path& dir, const TypeCase& t, int channels, std::int6
   settings.numChannels = static_cast<std::int16_t>(channels);
   settings.fileFormat = kSamp16;
   settings.clientFormat = kSamp16;
-  SoundFileWriter out(Spec(path), settings);
+  SoundFileWriter out(SpecOf(path), settings);
   const auto frames16 = Interleaved16(frames, channels);
   out.WriteInterleaved(frames16.data(), frames);
   out.Close();
@@ -55,12 +55,12 @@ fs::path Write16(const fs::path& dir, const TypeCase& t, int channels, std::int6
 }
 
 TEST(Facade, ReadsAnyRangeInAnyFormat) {
-  ScratchDir dir;
+  TempDir dir;
   constexpr std::int64_t kFrames = 5000;
   for (const auto& t : kTypes)
     for (int channels : {1, 2, 5, 8}) {
       SCOPED_TRACE(testing::Message() << t.extension << ", " << channels << " ch");
-      SoundFileReader file(Spec(Write16(dir.path, t, channels, kFrames)));
+      SoundFileReader file(SpecOf(Write16(dir.path, t, channels, kFrames)));
       ASSERT_EQ(file.GetLengthInFrames(), kFrames);
       ASSERT_EQ(file.GetNumChannels(), channels);
       EXPECT_EQ(file.GetAttributes().mSampleFormat, kSamp16);
@@ -95,8 +95,8 @@ TEST(Facade, ReadsAnyRangeInAnyFormat) {
 }
 
 TEST(Facade, AsyncReadsAndMonoSum) {
-  ScratchDir dir;
-  SoundFileReader file(Spec(Write16(dir.path, kTypes[2], 3, 20000)));
+  TempDir dir;
+  SoundFileReader file(SpecOf(Write16(dir.path, kTypes[2], 3, 20000)));
   for (SampleFormat f : {kSampFloat32, kSamp24}) {
     const int bytes = GetBytesPerSample(f);
     std::vector<Bytes> async(3, Bytes(8000 * static_cast<std::size_t>(bytes)));
@@ -127,10 +127,10 @@ TEST(Facade, AsyncReadsAndMonoSum) {
 }
 
 TEST(Facade, FormatsMakeFloatingPointReaders) {
-  ScratchDir dir;
+  TempDir dir;
   for (const auto& t : kTypes) {
     SCOPED_TRACE(t.extension);
-    SoundFileReader file(Spec(Write16(dir.path, t, 2, 3000)));
+    SoundFileReader file(SpecOf(Write16(dir.path, t, 2, 3000)));
     auto reader = file.GetFileFormat()->MakeFloatingPointReader({1000, 2500}, file.GetSampleRate());
     ASSERT_EQ(reader->GetFormat().mSampleFormat, kSampFloat32);
     ASSERT_EQ(reader->GetLengthInFrames(), 1500);
@@ -146,7 +146,7 @@ TEST(Facade, FormatsMakeFloatingPointReaders) {
 }
 
 TEST(Facade, FlushLeavesACompleteFileAndRecordingsCanOutgrowRIFF) {
-  ScratchDir dir;
+  TempDir dir;
   for (const auto& t : kTypes) {
     SCOPED_TRACE(t.extension);
     const fs::path path = dir.path / (std::string("rec.") + t.extension);
@@ -154,13 +154,14 @@ TEST(Facade, FlushLeavesACompleteFileAndRecordingsCanOutgrowRIFF) {
     settings.fileType = t.type;
     settings.numChannels = 2;
     settings.fileFormat = kSamp24;
-    SoundFileWriter out(Spec(path), settings);
+    SoundFileWriter out(SpecOf(path), settings);
     std::vector<float> frames(2 * 300, 0.5f);
     for (int k = 1; k <= 3; ++k) {
       out.WriteInterleaved(frames.data(), 300);
       out.Flush();
-      SoundFileReader check(Spec(path));
+      SoundFileReader check(SpecOf(path));
       EXPECT_EQ(check.GetLengthInFrames(), 300 * k);
+      EXPECT_EQ(out.GetFramesWritten(), 300 * k);
     }
     // A WAVE recording may grow to Wave64's limit: its format switches it
     // in place when RIFF's sizes run out.
@@ -186,7 +187,7 @@ void Append(const fs::path& path, const std::vector<std::int16_t>& samples, bool
 }
 
 TEST(Facade, RecoversCrashedRecordings) {
-  ScratchDir dir;
+  TempDir dir;
   for (const auto& t : kTypes)
     for (std::int64_t headerFrames : {0, 1000})
       for (int partial : {0, 2}) {
@@ -195,16 +196,16 @@ TEST(Facade, RecoversCrashedRecordings) {
         const fs::path path = Write16(dir.path, t, 2, headerFrames);
         // Intact files are left as they are.
         const auto before = fs::file_size(path);
-        SoundFileWriter::RecoverCrashedRecording(Spec(path));
+        SoundFileWriter::RecoverCrashedRecording(SpecOf(path));
         ASSERT_EQ(fs::file_size(path), before);
-        ASSERT_EQ(SoundFileReader(Spec(path)).GetLengthInFrames(), headerFrames);
+        ASSERT_EQ(SoundFileReader(SpecOf(path)).GetLengthInFrames(), headerFrames);
 
         // Audio the writer got to disk before it died, after the header's
         // last update: every whole frame of it is recovered.
         Append(path, Interleaved16(777, 2, headerFrames), t.bigEndian, partial);
-        SoundFileWriter::RecoverCrashedRecording(Spec(path));
+        SoundFileWriter::RecoverCrashedRecording(SpecOf(path));
         const std::int64_t expected = headerFrames + 777;
-        SoundFileReader file(Spec(path));
+        SoundFileReader file(SpecOf(path));
         ASSERT_EQ(file.GetLengthInFrames(), expected);
         std::vector<std::int16_t> l(1800), r(1800);
         void* p[] = {l.data(), r.data()};

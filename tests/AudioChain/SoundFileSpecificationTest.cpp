@@ -26,8 +26,8 @@ TEST(SoundFileSpecification, NamesEveryChannelOfTheUsualLayouts) {
       {"Take.1.wav", "Take.2.wav", "Take.3.wav", "Take.4.wav", "Take.5.wav", "Take.6.wav",
        "Take.7.wav", "Take.8.wav", "Take.9.wav"},
   };
-  ScratchDir dir;
-  const FileSpecification folder = Spec(dir.path);
+  TempDir dir;
+  const FileSpecification folder = SpecOf(dir.path);
   for (std::size_t n = 1; n <= expected.size(); ++n) {
     SCOPED_TRACE(testing::Message() << n << " ch");
     const SoundFileSpecification take(folder, UString("Take"), UString("wav"),
@@ -51,10 +51,10 @@ TEST(SoundFileSpecification, NamesEveryChannelOfTheUsualLayouts) {
     EXPECT_EQ(ErrorOf([&] { (void)take.GetFile(static_cast<int>(n)); }), -50);
     EXPECT_EQ(ErrorOf([&] { (void)take.GetFile(-1); }), -50);
   }
-  const SoundFileSpecification one(Spec(dir.path / "Mix.aif"));
+  const SoundFileSpecification one(SpecOf(dir.path / "Mix.aif"));
   EXPECT_FALSE(one.IsMultiMono());
-  EXPECT_EQ(one.GetFiles(), std::vector<FileSpecification>{Spec(dir.path / "Mix.aif")});
-  EXPECT_NE(one, SoundFileSpecification(Spec(dir.path / "Mix.aiff")));
+  EXPECT_EQ(one.GetFiles(), std::vector<FileSpecification>{SpecOf(dir.path / "Mix.aif")});
+  EXPECT_NE(one, SoundFileSpecification(SpecOf(dir.path / "Mix.aiff")));
 }
 
 TEST(SoundFileSpecification, SplitsChannelFileNames) {

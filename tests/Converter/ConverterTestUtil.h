@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 
 #include <cstdint>
-#include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -13,50 +12,26 @@
 #include <string>
 #include <vector>
 
+#include "TestSupport.h"
 #include "tarn/FileSystem/FileSpecification.h"
 #include "tarn/String/UString.h"
-
-#ifdef TARN_CONVERTER_FILES_SCRIPT
-#include <stdlib.h>  // mkdtemp
-#endif
 
 namespace tarn::test {
 
 namespace fs = std::filesystem;
 
-// $TARN_CONVERTER_FILES (CTest's fixture made it on the host), else on
-// POSIX a scratch folder that the script fills on first use.
-inline const fs::path& ConverterDir() {
-  struct Scratch {
-    fs::path path;
-    ~Scratch() {
-      std::error_code ignored;
-      if (!path.empty()) fs::remove_all(path, ignored);
-    }
-  };
-  static Scratch scratch;
-  static const fs::path dir = []() -> fs::path {
-    if (const char* env = std::getenv("TARN_CONVERTER_FILES"); env != nullptr && *env != 0)
-      return env;
-#ifdef TARN_CONVERTER_FILES_SCRIPT
-    std::string name = (fs::temp_directory_path() / "tarn-converter-XXXXXX").string();
-    if (::mkdtemp(name.data()) == nullptr) return {};
-    scratch.path = name;
-    const std::string command = "sh '" TARN_CONVERTER_FILES_SCRIPT "' '" + name + "'";
-    if (std::system(command.c_str()) == 0) return name;
+#ifndef TARN_CONVERTER_FILES_SCRIPT
+#define TARN_CONVERTER_FILES_SCRIPT ""
 #endif
-    return {};
-  }();
+inline const fs::path& ConverterDir() {
+  static const fs::path dir = FixtureDir("TARN_CONVERTER_FILES", TARN_CONVERTER_FILES_SCRIPT);
   return dir;
 }
-
 inline FileSpecification ConverterFile(const std::string& name) {
-  if (ConverterDir().empty()) {
-    ADD_FAILURE() << "no test files: run the tests through CTest, or make them with "
-                  << "tests/Converter/make-converter-files.sh DIR and set TARN_CONVERTER_FILES=DIR";
+  if (!HaveFixture(ConverterDir(), "tests/Converter/make-converter-files.sh",
+                   "TARN_CONVERTER_FILES"))
     return {};
-  }
-  return FileSpecification(UString((ConverterDir() / name).string()));
+  return SpecOf(ConverterDir() / name);
 }
 
 // ffmpeg's decode of `name` (interleaved float), or nothing when ffmpeg

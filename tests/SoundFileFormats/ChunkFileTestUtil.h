@@ -1,29 +1,23 @@
 #pragma once
-// Shared helpers of the sound-file tests: byte images of chunked files
-// (RIFF, Wave64, FORM) built chunk by chunk, AIFF payloads spelt out
-// big-endian, known sample ramps, scratch files, the error a call throws,
-// and, where the host's programs run, the folders of files they made and
-// their output.
+// Helpers of the sound-file tests: byte images of chunked files (RIFF,
+// Wave64, FORM) built chunk by chunk, AIFF payloads spelt out big-endian,
+// known sample ramps, the chunk model, and the error a call throws.
+// Scratch files and the host's programs come from TestSupport.h.
 
 #include <gtest/gtest.h>
 
 #include <array>
 #include <cstdint>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
-#include <fstream>
 #include <functional>
 #include <initializer_list>
-#include <iterator>
-#include <map>
 #include <optional>
-#include <random>
-#include <sstream>
 #include <string>
 #include <vector>
 
+#include "TestSupport.h"
 #include "tarn/Audio/SoundFileFormats/IEEEExtended.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFileEditor.h"
 #include "tarn/Audio/SoundFileFormats/RIFFFormatHandlers.h"
@@ -33,7 +27,6 @@
 
 namespace tarn::test {
 
-using Bytes = std::vector<std::uint8_t>;
 constexpr RIFFType T(const char (&code)[5]) { return MakeRIFFType(code); }
 
 // `n` bytes of `v`, least significant first.
@@ -433,53 +426,6 @@ class ChunkModel {
 
 // ------------------------------------------------------------ files, errors
 
-// A scratch folder removed with the fixture.
-class TempDir {
- public:
-  TempDir() {
-    const auto* info = ::testing::UnitTest::GetInstance()->current_test_info();
-    // One token per process: several copies of the suite (other worktrees,
-    // other presets) may run at once on the same machine.
-    static const std::string token = std::to_string(std::random_device{}());
-    std::string name = "tarn-sff-" + token + "-";
-    if (info != nullptr) name += std::string(info->test_suite_name()) + "-" + info->name();
-    for (char& ch : name)
-      if (ch == '/') ch = '_';
-    path_ = std::filesystem::temp_directory_path() / name;
-    std::filesystem::remove_all(path_);
-    std::filesystem::create_directories(path_);
-  }
-  TempDir(const TempDir&) = delete;
-  TempDir& operator=(const TempDir&) = delete;
-  ~TempDir() {
-    std::error_code ignored;
-    std::filesystem::remove_all(path_, ignored);
-  }
-  [[nodiscard]] std::filesystem::path Path(const std::string& name) const { return path_ / name; }
-
- private:
-  std::filesystem::path path_;
-};
-
-inline void WriteFile(const std::filesystem::path& path, const Bytes& bytes) {
-  std::ofstream out(path, std::ios::binary | std::ios::trunc);
-  out.write(reinterpret_cast<const char*>(bytes.data()),
-            static_cast<std::streamsize>(bytes.size()));
-  ASSERT_TRUE(out.good()) << path;
-}
-inline void AppendFile(const std::filesystem::path& path, const Bytes& bytes) {
-  std::ofstream out(path, std::ios::binary | std::ios::app);
-  out.write(reinterpret_cast<const char*>(bytes.data()),
-            static_cast<std::streamsize>(bytes.size()));
-}
-inline Bytes ReadFile(const std::filesystem::path& path) {
-  std::ifstream in(path, std::ios::binary);
-  return Bytes(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-}
-inline FileSpecification SpecOf(const std::filesystem::path& path) {
-  return FileSpecification(UString(reinterpret_cast<const char*>(path.u8string().c_str())));
-}
-
 // The error `action` throws (nullopt if it returns).
 inline std::optional<TarnError> ErrorOf(const std::function<void()>& action) {
   try {
@@ -501,72 +447,5 @@ inline void ExpectError(const std::function<void()>& action, const char* kind, i
   EXPECT_STREQ(error->GetKind().c_str(), kind);
   EXPECT_EQ(error->GetIntErrorCode(), code);
 }
-
-// ------------------------------------------------------------ host programs
-
-// The folder of files other programs made: $`env` (CTest's fixture made it
-// on the host), else, where `script` runs (POSIX), a scratch folder it fills
-// on first use and that goes with the process.
-inline std::filesystem::path FixtureDir(const char* env, [[maybe_unused]] const char* script) {
-  if (const char* dir = std::getenv(env); dir != nullptr && *dir != 0) return dir;
-#ifdef TARN_TEST_DECODERS
-  struct Scratch {
-    std::vector<std::filesystem::path> paths;
-    ~Scratch() {
-      std::error_code ignored;
-      for (const auto& p : paths) std::filesystem::remove_all(p, ignored);
-    }
-  };
-  static Scratch scratch;
-  std::string name = (std::filesystem::temp_directory_path() / "tarn-fixture-XXXXXX").string();
-  if (::mkdtemp(name.data()) == nullptr) return {};
-  scratch.paths.push_back(name);
-  if (std::system(("sh '" + std::string(script) + "' '" + name + "'").c_str()) == 0) return name;
-#endif
-  return {};
-}
-// `name` in `dir`, or an empty path and a failure that says how to make it.
-inline std::filesystem::path FixtureFile(const std::filesystem::path& dir, const std::string& name,
-                                         const char* script, const char* env) {
-  if (!dir.empty() && std::filesystem::exists(dir / name)) return dir / name;
-  ADD_FAILURE() << "no " << name << ": run the tests through CTest, or make the files with "
-                << "tests/SoundFileFormats/" << script << " DIR and set " << env << "=DIR";
-  return {};
-}
-
-#ifdef TARN_TEST_DECODERS
-// The standard output of `command`; fails the test when it exits non-zero.
-inline std::string RunTool(const std::string& command) {
-  std::string out;
-  FILE* pipe = ::popen((command + " 2>/dev/null").c_str(), "r");
-  if (pipe == nullptr) {
-    ADD_FAILURE() << "cannot run " << command;
-    return out;
-  }
-  char buffer[4096];
-  for (std::size_t n; (n = std::fread(buffer, 1, sizeof buffer, pipe)) > 0;) out.append(buffer, n);
-  EXPECT_EQ(::pclose(pipe), 0) << command;
-  return out;
-}
-// "key=value" lines (ffprobe) or "Key   : value" lines (sox --i), trimmed.
-inline std::map<std::string, std::string> Fields(const std::string& text, char separator) {
-  std::map<std::string, std::string> out;
-  std::istringstream lines(text);
-  const auto trim = [](std::string s) {
-    s.erase(0, s.find_first_not_of(' '));
-    s.erase(s.find_last_not_of(" \r'") + 1);
-    return s;
-  };
-  for (std::string line; std::getline(lines, line);)
-    if (const auto at = line.find(separator); at != std::string::npos)
-      out[trim(line.substr(0, at))] = trim(line.substr(at + 1));
-  return out;
-}
-// Fails the test unless `tool` is on PATH.
-inline void NeedTool(const char* tool, const char* package) {
-  ASSERT_EQ(std::system((std::string("command -v ") + tool + " >/dev/null 2>&1").c_str()), 0)
-      << tool << " is missing: install the Debian package " << package;
-}
-#endif
 
 }  // namespace tarn::test

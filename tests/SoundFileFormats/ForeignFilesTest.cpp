@@ -36,11 +36,12 @@ namespace fs = std::filesystem;
 
 fs::path ForeignFile(const std::string& name) {
   static const fs::path dir = FixtureDir("TARN_FOREIGN_FILES", TARN_FOREIGN_FILES_SCRIPT);
-  return FixtureFile(dir, name, "make-foreign-files.sh", "TARN_FOREIGN_FILES");
+  return FixtureFile(dir, name, "tests/SoundFileFormats/make-foreign-files.sh",
+                     "TARN_FOREIGN_FILES");
 }
 fs::path AIFFFile(const std::string& name) {
   static const fs::path dir = FixtureDir("TARN_AIFF_FILES", TARN_AIFF_FILES_SCRIPT);
-  return FixtureFile(dir, name, "make-aiff-files.sh", "TARN_AIFF_FILES");
+  return FixtureFile(dir, name, "tests/SoundFileFormats/make-aiff-files.sh", "TARN_AIFF_FILES");
 }
 
 // A test name from a file name.

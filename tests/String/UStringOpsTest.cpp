@@ -70,6 +70,7 @@ TEST(UStringOps, EveryFormOfTheSameTextIsEqual) {
       {"assign part", [&] { return UString().assign(UString("<") + text + UString(">"), 1, 4); }},
       {"assign Pascal", [&] { return UString().assign(pascal); }},
       {"append Pascal", [&] { return UString().append(pascal + 1, 1).append(pascal + 2, 6); }},
+      {"append whole Pascal", [&] { return UString().append(pascal); }},
       {"append std::string", [&] { return UString("a").append(std::string(utf8 + 1)); }},
       {"append units", [&] { return UString("a").append(utf16 + 1).append(noUnits); }},
       {"append counted units", [&] { return UString("a").append(utf16 + 1, 3); }},

@@ -11,13 +11,13 @@
 #include <filesystem>
 #include <fstream>
 #include <limits>
-#include <random>
 #include <string>
 #include <vector>
 
 #include "AudioJobs.h"
 #include "BextFields.h"
 #include "JsonWriter.h"
+#include "TestSupport.h"
 #include "ToolSupport.h"
 #include "tarn/Audio/SoundFileFormats/BWFBroadcastWaveExtension.h"
 #include "tarn/Audio/SoundFileFormats/SoundFileFormatCache.h"
@@ -27,23 +27,6 @@ namespace tarnfile {
 namespace {
 
 namespace fs = std::filesystem;
-
-class ScratchDir {
- public:
-  ScratchDir() {
-    std::random_device random;
-    path_ = fs::temp_directory_path() / ("tarnfile-unit-" + std::to_string(random()));
-    fs::create_directories(path_);
-  }
-  ~ScratchDir() {
-    std::error_code ignored;
-    fs::remove_all(path_, ignored);
-  }
-  std::string operator/(const std::string& name) const { return (path_ / name).string(); }
-
- private:
-  fs::path path_;
-};
 
 TEST(ToolCommandLine, SplitsWordsAndRefusesWhatItDoesNotKnow) {
   struct Case {
@@ -196,7 +179,7 @@ TEST(ToolBext, FieldsLandAtTheirByteOffsets) {
 }
 
 TEST(ToolFiles, ContainersAreKnownByTheirFirstBytes) {
-  ScratchDir dir;
+  tarn::test::TempDir dir;
   const std::string wave64 =
       std::string("riff\x2E\x91\xCF\x11\xA5\xD6\x28\xDB\x04\xC1\x00\x00", 16) + "rest";
   struct Case {
@@ -213,8 +196,9 @@ TEST(ToolFiles, ContainersAreKnownByTheirFirstBytes) {
       {"", Container::kUnknown},
   };
   for (const Case& c : cases) {
-    std::ofstream(dir / "f", std::ios::binary) << c.bytes;
-    EXPECT_EQ(SniffContainer(SpecForPath(dir / "f")), c.want) << ::testing::PrintToString(c.bytes);
+    std::ofstream(dir.Path("f"), std::ios::binary) << c.bytes;
+    EXPECT_EQ(SniffContainer(SpecForPath(dir.Path("f").string())), c.want)
+        << ::testing::PrintToString(c.bytes);
   }
 }
 
@@ -248,7 +232,7 @@ TEST(ToolFiles, FailuresNameTheFileTheyConcern) {
 // tool lets through is written and read back as asked, the rest is refused
 // before any file is made.
 TEST(ToolFiles, EveryContainerAndSampleFormatWrittenAndReadBack) {
-  ScratchDir dir;
+  tarn::test::TempDir dir;
   const Tone tone{ToneShape::kSine, 1000.0, 0.25};
   int written = 0;
   for (Container c : {Container::kRIFF, Container::kWave64, Container::kAIFF, Container::kAIFC}) {
@@ -258,7 +242,7 @@ TEST(ToolFiles, EveryContainerAndSampleFormatWrittenAndReadBack) {
         const auto format = static_cast<tarn::SampleFormat>(f);
         SCOPED_TRACE(std::string(FormatName(c)) + " " + SampleFormatName(format) + " " +
                      std::to_string(channels));
-        const std::string path = dir / ("f" + std::to_string(written) + ".snd");
+        const std::string path = dir.Path("f" + std::to_string(written) + ".snd").string();
         const AudioTarget target{c, format, channels, 22050.0, tarn::kNoDither, false};
         if (std::find(storable.begin(), storable.end(), format) == storable.end()) {
           EXPECT_THROW(CheckStorable(c, format, channels), UsageError);

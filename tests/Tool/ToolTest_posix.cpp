@@ -1,8 +1,8 @@
 // tarnfile as its users run it: exit statuses and messages, help, JSON keys,
-// what it reports against what sox and libsndfile's tools say of the same
-// files (made here by sox and ffmpeg), metadata edits that leave the audio
-// MD5 alone, recovery of an unclosed recording, conversion and tones read
-// back by those programs, and the demo.
+// what it reports against what sox says of the same files (made here by sox
+// and ffmpeg), metadata edits that leave the audio MD5 alone, recovery of an
+// unclosed recording, conversion and tones read back by those programs, and
+// the demo.
 
 #include <gtest/gtest.h>
 #include <sys/wait.h>
@@ -192,11 +192,11 @@ const PeerFile kPeerFiles[] = {
      "f32", "big", ""},
 };
 
-TEST_F(ToolTest, InfoAgreesWithSoxAndLibsndfile) {
+// (One peer's word per fact: what the reader finds in these files is
+// checked against libsndfile and ffprobe by the sound-file format tests.)
+TEST_F(ToolTest, InfoAgreesWithSox) {
   Need("sox", "sox");
   Need("ffmpeg", "ffmpeg");
-  Need("sndfile-info", "sndfile-programs");
-  Need("mediainfo", "mediainfo");
   for (const PeerFile& f : kPeerFiles) {
     SCOPED_TRACE(f.name);
     Make(f.make);
@@ -213,10 +213,6 @@ TEST_F(ToolTest, InfoAgreesWithSoxAndLibsndfile) {
     EXPECT_EQ(JsonValue(json, "channels"), Output(std::string("soxi -c ") + f.name));
     EXPECT_EQ(JsonValue(json, "rate"), Output(std::string("soxi -r ") + f.name));
     EXPECT_EQ(JsonValue(json, "frames"), Output(std::string("soxi -s ") + f.name));
-    EXPECT_EQ(JsonValue(json, "frames"), Output(std::string("sndfile-info ") + f.name +
-                                                " | sed -n 's/^Frames *: *//p' | head -n 1"));
-    EXPECT_EQ(JsonValue(json, "channels"),
-              Output(std::string("mediainfo --Inform='Audio;%Channels%' ") + f.name));
     // The audio MD5 is that of the samples as sox decodes them to raw bytes.
     if (*f.rawForMD5) {
       const Result ours = Tool(std::string("md5 ") + f.name);
