@@ -13,7 +13,9 @@
 //              floor the platform sets under that ratio.
 //   Write      the same frames from per-channel float into a new 24-bit
 //              file: ours through SoundFileWriter (cached and unbuffered),
-//              libsndfile interleaving first and then sf_writef_float.
+//              libsndfile interleaving first and then sf_writef_float; our
+//              Close forces the data to the disk (fdatasync), so libsndfile
+//              is also timed with an fdatasync after sf_close (WriteDurable).
 //   AsyncRead  the completion latency of one 4 KiB read from the page cache:
 //              PlatformAudioFile::AsyncRead on its reader thread against
 //              pread on a condition-variable worker thread.
@@ -140,7 +142,9 @@ void WriteOurs(const std::string& path, std::int64_t frames, bool unbuffered) {
   out.Close();
 }
 
-void WriteSndfile(const std::string& path, std::int64_t frames) {
+// `durable`: the file's data is forced to the disk after sf_close, as our
+// writer's Close does (a recording must survive a crash once closed).
+void WriteSndfile(const std::string& path, std::int64_t frames, bool durable) {
   SF_INFO info{};
   info.samplerate = 48000;
   info.channels = kChannels;
@@ -157,6 +161,13 @@ void WriteSndfile(const std::string& path, std::int64_t frames) {
     sf_writef_float(file, interleaved.data(), n);
   }
   sf_close(file);
+  if (durable) {
+    const int fd = ::open(path.c_str(), O_WRONLY);
+    if (fd >= 0) {
+      ::fdatasync(fd);
+      ::close(fd);
+    }
+  }
 }
 
 double ReadOurs(const std::string& path, int cachingMode) {
@@ -292,7 +303,9 @@ int main() {
                 static_cast<long long>(megabytes), dir.c_str());
     const double writeOurs = TimeMedian(3, nothing, [&] { WriteOurs(ours, frames, false); });
     const double writeUnbuffered = TimeMedian(3, nothing, [&] { WriteOurs(ours, frames, true); });
-    const double writeTheirs = TimeMedian(3, nothing, [&] { WriteSndfile(theirs, frames); });
+    const double writeTheirs = TimeMedian(3, nothing, [&] { WriteSndfile(theirs, frames, false); });
+    const double writeTheirsDurable =
+        TimeMedian(3, nothing, [&] { WriteSndfile(theirs, frames, true); });
 
     WarmCache(ours);
     double checkOurs = 0, checkTheirs = 0;
@@ -319,6 +332,7 @@ int main() {
     row("write ours (float->s24)", writeOurs);
     row("write ours unbuffered", writeUnbuffered);
     row("write libsndfile", writeTheirs);
+    row("write libsndfile + fdatasync", writeTheirsDurable);
     row("read ours cached", readOurs);
     row("read ours unbuffered (warm)", readUnbufferedWarm);
     row("read libsndfile", readTheirs);
@@ -329,6 +343,8 @@ int main() {
     std::printf("\n");
     Report("Write", "libsndfile", writeOurs, writeTheirs, "s");
     Report("WriteUnbuffered", "libsndfile", writeUnbuffered, writeTheirs, "s");
+    // Ours closes durably (fdatasync): the same guarantee asked of the peer.
+    Report("WriteDurable", "libsndfile_fdatasync", writeOurs, writeTheirsDurable, "s");
     Report("Read", "libsndfile", readOurs, readTheirs, "s");
     Report("ReadUnbuffered", "libsndfile", readUnbufferedWarm, readTheirs, "s");
     Report("ReadCold", "cached_cold", coldUnbuffered, coldCached, "s");
