@@ -104,6 +104,7 @@ void InterleaveN(const void* const* channels, std::size_t offset, unsigned char*
 
 void Deinterleave(const void* interleaved, void* const* channels, int numChannels,
                   int bytesPerSample, std::size_t frames, std::size_t offset) noexcept {
+  if (frames == 0) return;  // the buffers of an empty block may be null
   const auto* in = static_cast<const unsigned char*>(interleaved);
   if (numChannels == 1) {
     std::memcpy(static_cast<unsigned char*>(channels[0]) + offset * bytesPerSample, in,
@@ -128,6 +129,7 @@ void Deinterleave(const void* interleaved, void* const* channels, int numChannel
 
 void Interleave(const void* const* channels, std::size_t offset, void* interleaved, int numChannels,
                 int bytesPerSample, std::size_t frames) noexcept {
+  if (frames == 0) return;  // the buffers of an empty block may be null
   auto* out = static_cast<unsigned char*>(interleaved);
   if (numChannels == 1) {
     std::memcpy(out, static_cast<const unsigned char*>(channels[0]) + offset * bytesPerSample,
