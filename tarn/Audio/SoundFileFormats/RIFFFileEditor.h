@@ -52,12 +52,11 @@
 // passes the end of the file, though by less than the file's whole length,
 // so the listing keeps it) throws "RIFFFileEditor" code 2 and writes nothing; a
 // chunk to write that has no identifier in Wave64 mode, the null tag, or an
-// empty "SSND" chunk in a FORM file throws -50 before the file is touched; stream errors (-36 I/O, -39 end of file, -5000 cannot
-// open) propagate. A damaged or truncated chunk header, or a non-audio chunk
-// whose size is larger than the whole file, ends the listing silently: the
-// chunks before it stay listed. An audio chunk that large, or an "SSND"
-// chunk of size 0 with bytes after its header, is listed as running to the
-// end of the file (AudioRunsToEndOfFile).
+// empty "SSND" chunk in a FORM file throws -50 before the file is touched; stream errors (-36 I/O,
+// -39 end of file, -5000 cannot open) propagate. A damaged or truncated chunk header, or a
+// non-audio chunk whose size is larger than the whole file, ends the listing silently: the chunks
+// before it stay listed. An audio chunk that large, or an "SSND" chunk of size 0 with bytes after
+// its header, is listed as running to the end of the file (AudioRunsToEndOfFile).
 //
 // Threads: ReadChunkData, AddChunkData, JunkChunk, CountPostAudioChunks,
 // GetNthPostAudioChunks, RemoveTrailingMetaData and Reset take the editor's
