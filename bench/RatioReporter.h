@@ -27,9 +27,17 @@ inline void PrintRatio(const std::string& what, const std::string& peer, double 
 class RatioReporter : public benchmark::ConsoleReporter {
  public:
   void ReportRuns(const std::vector<Run>& runs) override {
-    for (const Run& r : runs)
-      if (r.run_type == Run::RT_Iteration && r.iterations > 0)
-        times_[r.benchmark_name()] = r.GetAdjustedCPUTime();
+    // With --benchmark_repetitions the median of the repetitions stands for
+    // the case; otherwise its one run does.
+    for (const Run& r : runs) {
+      const std::string name = r.run_name.str();
+      if (r.run_type == Run::RT_Aggregate && r.aggregate_name == "median") {
+        times_[name] = r.GetAdjustedCPUTime();
+        medians_[name] = true;
+      } else if (r.run_type == Run::RT_Iteration && r.iterations > 0 && !medians_[name]) {
+        times_[name] = r.GetAdjustedCPUTime();
+      }
+    }
     ConsoleReporter::ReportRuns(runs);
   }
 
@@ -40,12 +48,23 @@ class RatioReporter : public benchmark::ConsoleReporter {
       const std::string stem = name.substr(0, at + 1);
       for (const auto& [peer, theirs] : times_)
         if (peer != name && peer.rfind(stem, 0) == 0)
-          PrintRatio(name.substr(0, at), peer.substr(stem.size()), ours / theirs);
+          PrintRatio(name.substr(0, at), WithoutTimeSuffixes(peer.substr(stem.size())),
+                     ours / theirs);
     }
   }
 
  private:
+  // "glibc/process_time/real_time" -> "glibc": the timing options that
+  // every case of a benchmark shares say nothing about the peer.
+  static std::string WithoutTimeSuffixes(std::string name) {
+    for (const char* suffix : {"/process_time", "/real_time"})
+      for (auto at = name.find(suffix); at != std::string::npos; at = name.find(suffix))
+        name.erase(at, std::char_traits<char>::length(suffix));
+    return name;
+  }
+
   std::map<std::string, double> times_;
+  std::map<std::string, bool> medians_;
 };
 
 // Runs the registered benchmarks, then prints the ratios.
