@@ -192,13 +192,20 @@ inline uint8_t*& PrevOf(uint8_t* block) noexcept {
 std::atomic_flag gRegistryLock = ATOMIC_FLAG_INIT;
 BuddySystemSubAllocator* gRegistry = nullptr;
 
-struct RegistryGuard {
-  RegistryGuard() noexcept {
-    while (gRegistryLock.test_and_set(std::memory_order_acquire)) hydra_os::SleepMilliseconds(0);
+// Holds a flag used as a lock for a scope. The allocator's locks guard rare,
+// short steps (registry changes, orphan pops): a waiter just yields its time
+// slice until the flag is free.
+class FlagGuard {
+ public:
+  explicit FlagGuard(std::atomic_flag& flag) noexcept : fFlag(flag) {
+    while (fFlag.test_and_set(std::memory_order_acquire)) hydra_os::SleepMilliseconds(0);
   }
-  ~RegistryGuard() { gRegistryLock.clear(std::memory_order_release); }
-  RegistryGuard(const RegistryGuard&) = delete;
-  RegistryGuard& operator=(const RegistryGuard&) = delete;
+  ~FlagGuard() { fFlag.clear(std::memory_order_release); }
+  FlagGuard(const FlagGuard&) = delete;
+  FlagGuard& operator=(const FlagGuard&) = delete;
+
+ private:
+  std::atomic_flag& fFlag;
 };
 
 // Read straight off the thread pointer (initial-exec): the allocation and
@@ -232,7 +239,7 @@ BuddySystemSubAllocator* BuddySystemSubAllocator::Create() noexcept {
   if (!memory) return nullptr;
   assert(reinterpret_cast<uintptr_t>(memory) % 16 == 0);
   auto* s = new (memory) BuddySystemSubAllocator();
-  RegistryGuard guard;
+  FlagGuard guard(gRegistryLock);
   s->regNext = gRegistry;
   if (gRegistry) gRegistry->regPrev = s;
   gRegistry = s;
@@ -241,7 +248,7 @@ BuddySystemSubAllocator* BuddySystemSubAllocator::Create() noexcept {
 
 void BuddySystemSubAllocator::Destroy(BuddySystemSubAllocator* s) noexcept {
   {
-    RegistryGuard guard;
+    FlagGuard guard(gRegistryLock);
     if (s->regPrev)
       s->regPrev->regNext = s->regNext;
     else
@@ -746,9 +753,8 @@ BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorForCurrentThread() noexc
   // A new thread takes over an orphan, if there is one: the blocks the
   // orphan still has out are then freed by its new owner as they come back,
   // not up to half a second later by the pool thread, and its chunks serve
-  // the new thread at once. Programs
-  // that start a thread per task keep a handful of sub-allocators instead
-  // of one per recently ended thread.
+  // the new thread at once. Programs that start a thread per task keep a
+  // handful of sub-allocators instead of one per recently ended thread.
   BuddySystemSubAllocator* s = GetSubAllocatorOrphan();
   if (s) {
     s->next = nullptr;
@@ -767,11 +773,8 @@ BuddySystemSubAllocator* HydraAllocator::GetSubAllocatorOrphan() noexcept {
   // Pops are serialized: a popped orphan may be destroyed (by the pool
   // thread, or by its adopter's thread ending), so no other pop may still be
   // reading its link. Pushes need no lock.
-  while (fPool->fOrphanPopLock.test_and_set(std::memory_order_acquire))
-    hydra_os::SleepMilliseconds(0);
-  void* orphan = DequeueAtomic(&fPool->fOrphans);
-  fPool->fOrphanPopLock.clear(std::memory_order_release);
-  return static_cast<BuddySystemSubAllocator*>(orphan);
+  FlagGuard guard(fPool->fOrphanPopLock);
+  return static_cast<BuddySystemSubAllocator*>(DequeueAtomic(&fPool->fOrphans));
 }
 
 void HydraAllocator::SubAllocatorDestructor(void* subAllocator) noexcept {
@@ -857,7 +860,7 @@ template <class Figure>
 uint64_t SumOverSubAllocators(Figure figure) noexcept {
   (void)HydraAllocator::Instance();
   if (BuddySystemSubAllocator* self = tCurrent) self->DrainRemoteFrees();
-  RegistryGuard guard;
+  FlagGuard guard(gRegistryLock);
   uint64_t sum = 0;
   for (BuddySystemSubAllocator* s = gRegistry; s; s = s->regNext) sum += figure(*s);
   return sum;

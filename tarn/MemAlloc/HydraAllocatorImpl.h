@@ -113,7 +113,6 @@ class HydraGlobalPool {
   std::atomic<uint64_t> fOSBytes{0};  // sizes of all live chunks (+ headers)
   std::atomic<uint64_t> fOrphanCount{0};
   std::atomic<bool> fThreadStarted{false};
-  std::atomic_flag fNodeBatchLock = ATOMIC_FLAG_INIT;
   // Held for each pop of fOrphans (the pool thread's, and a new thread's
   // adopting an orphan), so that no pop reads the link of an orphan that
   // another popper took and destroyed.
