@@ -6,7 +6,7 @@
 #include <limits>
 #include <mutex>
 #include <new>
-#include <vector>
+#include <utility>
 
 #include "tarn/Audio/AudioOutFile.h"
 #include "tarn/Errors/Fail.h"
@@ -40,10 +40,7 @@ struct AudioInFile::Prefetch {
   bool valid = false;         // a finished read of [position, position + result.bytes)
   std::int64_t position = 0;  // a multiple of the block size
   FileResult result{};
-  // Whole blocks go straight from the disk to `data`, the first block
-  // boundary in `buffer`.
-  std::vector<std::byte> buffer;
-  std::byte* data = nullptr;
+  BlockAlignedBuffer buffer;  // whole blocks go straight from the disk here
 };
 
 AudioInFile::AudioInFile(const DSPSoundBiteSpec& bite, const FileLength& length,
@@ -84,20 +81,7 @@ void AudioInFile::SettlePrefetch() noexcept {
 FileResult AudioInFile::ReadBytes(PlatformAudioFile& file, void* buffer, std::int64_t position,
                                   std::int64_t count) {
   SettlePrefetch();
-  FileResult result{kFileOK, 0};
-  if (prefetch_ && prefetch_->valid &&
-      (prefetch_->result.status == kFileOK || prefetch_->result.status == kFileEOFErr) &&
-      position >= prefetch_->position && position < prefetch_->position + prefetch_->result.bytes) {
-    const std::int64_t skip = position - prefetch_->position;
-    const std::int64_t served = std::min(count, prefetch_->result.bytes - skip);
-    // The file may have been cut since the block was read.
-    const FileResult size = file.GetSize();
-    if (size.status == kFileOK && size.bytes >= position + served) {
-      std::memcpy(buffer, prefetch_->data + skip, static_cast<std::size_t>(served));
-      result.bytes = served;
-    }
-  }
-  if (prefetch_) prefetch_->valid = false;
+  FileResult result{kFileOK, TakePrefetched(file, buffer, position, count)};
   if (result.bytes < count) {
     const FileResult rest = file.SyncRead(static_cast<std::byte*>(buffer) + result.bytes,
                                           static_cast<std::uint64_t>(count - result.bytes),
@@ -106,30 +90,43 @@ FileResult AudioInFile::ReadBytes(PlatformAudioFile& file, void* buffer, std::in
   }
   const bool forward = position == nextSequential_;
   nextSequential_ = position + result.bytes;
-  const std::int64_t next = position + count;
+  if (forward && result.status == kFileOK) QueuePrefetch(file, position + count, count);
+  return result;
+}
+
+std::int64_t AudioInFile::TakePrefetched(PlatformAudioFile& file, void* buffer,
+                                         std::int64_t position, std::int64_t count) {
+  if (!prefetch_) return 0;
+  Prefetch& p = *prefetch_;
+  const bool finished = std::exchange(p.valid, false);  // a block serves one request
+  const bool usable = finished && (p.result.status == kFileOK || p.result.status == kFileEOFErr) &&
+                      position >= p.position && position < p.position + p.result.bytes;
+  if (!usable) return 0;
+  const std::int64_t skip = position - p.position;
+  const std::int64_t served = std::min(count, p.result.bytes - skip);
+  // The file may have been cut since the block was read.
+  const FileResult size = file.GetSize();
+  if (size.status != kFileOK || size.bytes < position + served) return 0;
+  std::memcpy(buffer, p.buffer.Data() + skip, static_cast<std::size_t>(served));
+  return served;
+}
+
+void AudioInFile::QueuePrefetch(PlatformAudioFile& file, std::int64_t next, std::int64_t count) {
   const std::int64_t ahead = std::min({count, dataEnd_ - next, kMaxPrefetchBytes});
-  if (!forward || result.status != kFileOK || ahead <= 0 || !file.NeedsAlignment() ||
-      PlatformAudioFile::IsReaderThread())
-    return result;
+  if (ahead <= 0 || !file.NeedsAlignment() || PlatformAudioFile::IsReaderThread()) return;
   if (!prefetch_) prefetch_ = std::make_shared<Prefetch>();
   Prefetch& p = *prefetch_;
   constexpr std::int64_t kBlock = PlatformAudioFile::kBlockSize;
   const std::int64_t alignedStart = next / kBlock * kBlock;
   const std::int64_t span = (next + ahead + kBlock - 1) / kBlock * kBlock - alignedStart;
-  if (p.buffer.size() < static_cast<std::size_t>(span + kBlock)) {
-    p.buffer.clear();
-    p.buffer.resize(static_cast<std::size_t>(span + kBlock));
-    const auto address = reinterpret_cast<std::uintptr_t>(p.buffer.data());
-    p.data = p.buffer.data() + (kBlock - static_cast<std::int64_t>(address % kBlock)) % kBlock;
-  }
   p.position = alignedStart;
   {
     std::lock_guard lock(p.mutex);
     p.inFlight = true;
   }
   try {
-    file.AsyncRead(p.data, static_cast<std::uint64_t>(alignedStart),
-                   static_cast<std::uint64_t>(span),
+    file.AsyncRead(p.buffer.Reserve(static_cast<std::uint64_t>(span)),
+                   static_cast<std::uint64_t>(alignedStart), static_cast<std::uint64_t>(span),
                    [state = prefetch_](std::int32_t status, std::int32_t bytes) {
                      std::lock_guard lock(state->mutex);
                      state->result = {static_cast<FileStatus>(status), bytes};
@@ -142,7 +139,6 @@ FileResult AudioInFile::ReadBytes(PlatformAudioFile& file, void* buffer, std::in
     std::lock_guard lock(p.mutex);
     p.inFlight = false;
   }
-  return result;
 }
 
 SampleCount AudioInFile::GetLengthInFrames() const {

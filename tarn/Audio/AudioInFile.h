@@ -101,6 +101,13 @@ class AudioInFile : public AudioFile, public AsyncAudioReader {
   // when it matches, and queues the next prefetch when reads run forward.
   FileResult ReadBytes(PlatformAudioFile& file, void* buffer, std::int64_t position,
                        std::int64_t count);
+  // Copies what the finished prefetch holds of the request's start (as far
+  // as the file still reaches) and marks the prefetch used; the bytes copied.
+  std::int64_t TakePrefetched(PlatformAudioFile& file, void* buffer, std::int64_t position,
+                              std::int64_t count);
+  // Queues the read of up to `count` bytes from file offset `next` on the
+  // reader thread, for a file read without the system cache.
+  void QueuePrefetch(PlatformAudioFile& file, std::int64_t next, std::int64_t count);
   // Waits until no prefetch is in flight (on the reader thread, forgets it:
   // it runs after the current job there).
   void SettlePrefetch() noexcept;

@@ -49,12 +49,7 @@ class PlatformAudioFile::Impl {
   FileStatus Write(const void* buffer, std::uint64_t count, std::optional<std::uint64_t> at);
 
   std::shared_ptr<IFileDriver> driver_;
-  // Bounce buffer: bounceRaw_ holds bounceCapacity_ + 4096 bytes and
-  // bounce_ is the first 4096-byte boundary strictly above its start, so
-  // [bounce_, bounce_ + bounceCapacity_) lies inside the allocation.
-  std::unique_ptr<unsigned char[]> bounceRaw_;
-  std::uint64_t bounceCapacity_ = 0;
-  unsigned char* bounce_ = nullptr;
+  BlockAlignedBuffer bounce_;
   std::uint64_t position_ = 0;
 
  private:
@@ -63,31 +58,30 @@ class PlatformAudioFile::Impl {
     return !driver_->NeedsAlignment() || (IsAligned(reinterpret_cast<std::uintptr_t>(buffer)) &&
                                           IsAligned(count) && IsAligned(position));
   }
-  // Grows (never shrinks) the bounce buffer to `bytes`; old contents go.
-  void ReserveBounce(std::uint64_t bytes);
   // Reads [alignedStart, alignedEnd) into the bounce buffer and returns the
   // driver's result.
   FileResult FillBounce(std::uint64_t alignedStart, std::uint64_t alignedEnd);
 };
 
-void PlatformAudioFile::Impl::ReserveBounce(std::uint64_t bytes) {
-  if (bytes <= bounceCapacity_) return;
+std::byte* BlockAlignedBuffer::Reserve(std::uint64_t bytes) {
+  if (bytes <= capacity_) return data_;
   if (bytes > std::numeric_limits<std::size_t>::max() - kBlock) throw std::bad_alloc();
-  bounceRaw_.reset();
-  bounce_ = nullptr;
-  bounceCapacity_ = 0;
-  bounceRaw_.reset(new unsigned char[static_cast<std::size_t>(bytes + kBlock)]);
-  const auto raw = reinterpret_cast<std::uintptr_t>(bounceRaw_.get());
-  bounce_ = bounceRaw_.get() + (kBlock - (raw & kBlockMask));
-  bounceCapacity_ = bytes;
+  raw_.reset();
+  data_ = nullptr;
+  capacity_ = 0;
+  raw_.reset(new std::byte[static_cast<std::size_t>(bytes + kBlock)]);
+  const auto raw = reinterpret_cast<std::uintptr_t>(raw_.get());
+  data_ = raw_.get() + (kBlock - (raw & kBlockMask));
+  capacity_ = bytes;
+  return data_;
 }
 
 FileResult PlatformAudioFile::Impl::FillBounce(std::uint64_t alignedStart,
                                                std::uint64_t alignedEnd) {
-  ReserveBounce(alignedEnd - alignedStart);
+  std::byte* const bounce = bounce_.Reserve(alignedEnd - alignedStart);
   if (const FileStatus status = driver_->SetFilePointer(alignedStart); status != kFileOK)
     return {status, 0};
-  return driver_->Read(bounce_, alignedEnd - alignedStart);
+  return driver_->Read(bounce, alignedEnd - alignedStart);
 }
 
 FileResult PlatformAudioFile::Impl::Read(void* buffer, std::uint64_t count,
@@ -112,7 +106,8 @@ FileResult PlatformAudioFile::Impl::Read(void* buffer, std::uint64_t count,
   const std::uint64_t validEnd = std::min(end, readEnd);
   const std::uint64_t valid = validEnd > position ? validEnd - position : 0;
   if (valid != 0)
-    std::memcpy(buffer, bounce_ + (position - alignedStart), static_cast<std::size_t>(valid));
+    std::memcpy(buffer, bounce_.Data() + (position - alignedStart),
+                static_cast<std::size_t>(valid));
   position_ = position + valid;
   // The end of the file inside the last block is no error of this read.
   if (result.status == kFileEOFErr && valid == count) result.status = kFileOK;
@@ -141,24 +136,24 @@ FileStatus PlatformAudioFile::Impl::Write(const void* buffer, std::uint64_t coun
   const std::uint64_t alignedEnd = (newEnd + kBlockMask) & ~kBlockMask;
   // When the pre-read met the end of the file: where the file ended.
   std::optional<std::uint64_t> oldEnd;
-  ReserveBounce(alignedEnd - alignedStart);
+  std::byte* const bounce = bounce_.Reserve(alignedEnd - alignedStart);
   if (alignedStart != position || alignedEnd != newEnd) {
     // Read-modify-write of the partial blocks at either edge.
     const FileResult pre = FillBounce(alignedStart, alignedEnd);
     if (pre.status == kFileEOFErr) {
       oldEnd = alignedStart + static_cast<std::uint64_t>(pre.bytes);
       // Filler past the end of the file reads as zeros, as a hole would.
-      std::memset(bounce_ + pre.bytes, 0,
+      std::memset(bounce + pre.bytes, 0,
                   static_cast<std::size_t>(alignedEnd - alignedStart -
                                            static_cast<std::uint64_t>(pre.bytes)));
     } else if (pre.status != kFileOK) {
       return pre.status;
     }
   }
-  std::memcpy(bounce_ + (position - alignedStart), buffer, static_cast<std::size_t>(count));
+  std::memcpy(bounce + (position - alignedStart), buffer, static_cast<std::size_t>(count));
   if (const FileStatus status = driver_->SetFilePointer(alignedStart); status != kFileOK)
     return status;
-  if (const FileStatus status = driver_->Write(bounce_, alignedEnd - alignedStart);
+  if (const FileStatus status = driver_->Write(bounce, alignedEnd - alignedStart);
       status != kFileOK)
     return status;
   // The filler of the last block must not lengthen the file (nor may a

@@ -31,6 +31,7 @@
 //   FileResult r = file.SyncRead(buffer, 10, 5);   // any range, any buffer
 //   file.AsyncRead(buffer, 0, 4096, [](std::int32_t status, std::int32_t bytes) { ... });
 
+#include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <memory>
@@ -94,6 +95,23 @@ class PlatformAudioFile {
  private:
   // Shared with queued asynchronous reads, which keep it alive.
   std::shared_ptr<Impl> impl_;
+};
+
+// Grow-only storage whose start lies on a PlatformAudioFile::kBlockSize
+// boundary, for whole-block transfers of files that need alignment.
+// Reserve throws std::bad_alloc when memory runs out (the buffer is then
+// empty). One thread at a time.
+class BlockAlignedBuffer {
+ public:
+  // At least `bytes` usable bytes at the returned Data() from now on; the
+  // contents are lost when the buffer grows.
+  std::byte* Reserve(std::uint64_t bytes);
+  [[nodiscard]] std::byte* Data() const noexcept { return data_; }
+
+ private:
+  std::unique_ptr<std::byte[]> raw_;  // capacity_ + kBlockSize bytes
+  std::uint64_t capacity_ = 0;
+  std::byte* data_ = nullptr;  // the first block boundary in raw_
 };
 
 }  // namespace tarn
