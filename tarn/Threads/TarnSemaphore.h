@@ -63,7 +63,8 @@ class TarnBinarySemaphore {
   // state: bit 0 is the unit, the bits above count the threads asleep in a
   // wait (state >> 1 == sleepers). Unused where fImpl holds a system object.
   std::atomic<uint32_t> fState;
-  TarnBinarySemaphoreImpl* fImpl;
+  // The system object where the platform cannot sleep on an address.
+  [[maybe_unused]] TarnBinarySemaphoreImpl* fImpl;
 };
 
 // Waits on the semaphore for the lifetime of the guard, signals it after.
