@@ -332,6 +332,20 @@ TEST(RIFFEditorEdits, AudioRunningPastTheEndIsFixedFirstAndAMissingPadByteRestor
   Editor(path, Container::kRIFF)->AddChunkData({kList, {}, Blob(Pattern(1))}, kData);
   EXPECT_EQ(ReadFile(path),
             FileImage({{kData, Pattern(5)}, {kList, Pattern(1)}}, Container::kRIFF));
+  // An "SSND" header at the very end: of size 0 it would list as running to
+  // the end again, over what follows, so it becomes an empty chunk.
+  const RIFFType sound = AudioTagOf(Container::kFORM);
+  WriteFile(path, FileImage({{kFmt, Pattern(4)}, {sound, {}, 138}}, Container::kFORM));
+  const auto editor = Editor(path, Container::kFORM);
+  ASSERT_TRUE(editor->AudioRunsToEndOfFile());
+  editor->AddChunkData({kBext, {}, Blob(Pattern(3))}, sound);
+  EXPECT_EQ(ReadFile(path),
+            FileImage({{kFmt, Pattern(4)}, {sound, Bytes(8, 0)}}, Container::kFORM));
+  editor->AddChunkData({kBext, {}, Blob(Pattern(3))}, sound);
+  EXPECT_EQ(
+      ReadFile(path),
+      FileImage({{kFmt, Pattern(4)}, {sound, Bytes(8, 0)}, {kBext, Pattern(3)}}, Container::kFORM));
+  EXPECT_TRUE(Editor(path, Container::kFORM)->HasChunk(kBext));
 }
 
 // A last chunk cut short stays listed at its claimed size; an edit then

@@ -461,6 +461,18 @@ void RIFFFileEditor::WriteSegmentActions(const ChunkData* chunk, const UUIDObj& 
         removed = true;
         continue;  // a cut chunk ends nothing: the end stays where it was
       case kFixAudioHeader:
+        if (info.tag == kSoundTag && info.length == 0) {
+          // Nothing follows the header, and "SSND" of size 0 would list
+          // again as running to the end, over every chunk appended later:
+          // the chunk gets the zero offset and block size of an empty one,
+          // written past the end of the file, and the container grows.
+          static constexpr std::uint8_t kEmptySound[8] = {};
+          stream_->MoveTo(info.offset + headerSize);
+          stream_->PutRawDataToStream(kEmptySound, sizeof kEmptySound);
+          info.length = sizeof kEmptySound;
+          stream_->MoveTo(GetIDSize());
+          WriteLength(info.offset + info.length);  // the container ends with this chunk
+        }
         stream_->MoveTo(info.offset);
         WriteRIFFType(info.tag, info.uuid);
         WriteLength(info.length);

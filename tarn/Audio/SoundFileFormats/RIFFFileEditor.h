@@ -28,7 +28,10 @@
 //     rewritten and the file is cut to its new end;
 //   - when the audio chunk was listed as running past the end of the file (a
 //     recording whose sizes were never written), that call only rewrites the
-//     audio chunk's identifier and size field and adds nothing.
+//     audio chunk's identifier and size field and adds nothing (except to an
+//     "SSND" chunk with no bytes after its header, which gets the eight zero
+//     bytes of an empty one: of size 0 it would list as running to the end
+//     again).
 // Only metadata regions are written: the bytes of the audio payload are never
 // read for an edit nor written. An edit that fails half-way (full disk, I/O
 // error) leaves the audio payload intact and the chunks up to and including
