@@ -332,20 +332,22 @@ TEST(RIFFEditorEdits, AudioRunningPastTheEndIsFixedFirstAndAMissingPadByteRestor
   Editor(path, Container::kRIFF)->AddChunkData({kList, {}, Blob(Pattern(1))}, kData);
   EXPECT_EQ(ReadFile(path),
             FileImage({{kData, Pattern(5)}, {kList, Pattern(1)}}, Container::kRIFF));
-  // An "SSND" header at the very end: of size 0 it would list as running to
-  // the end again, over what follows, so it becomes an empty chunk.
+  // An "SSND" header at the very end, its size a lie (fixed to 0 first) or
+  // 0: of size 0 with a chunk after it, it would list as running to the end
+  // over that chunk, so it becomes an empty chunk before the append.
   const RIFFType sound = AudioTagOf(Container::kFORM);
-  WriteFile(path, FileImage({{kFmt, Pattern(4)}, {sound, {}, 138}}, Container::kFORM));
-  const auto editor = Editor(path, Container::kFORM);
-  ASSERT_TRUE(editor->AudioRunsToEndOfFile());
-  editor->AddChunkData({kBext, {}, Blob(Pattern(3))}, sound);
-  EXPECT_EQ(ReadFile(path),
-            FileImage({{kFmt, Pattern(4)}, {sound, Bytes(8, 0)}}, Container::kFORM));
-  editor->AddChunkData({kBext, {}, Blob(Pattern(3))}, sound);
-  EXPECT_EQ(
-      ReadFile(path),
-      FileImage({{kFmt, Pattern(4)}, {sound, Bytes(8, 0)}, {kBext, Pattern(3)}}, Container::kFORM));
-  EXPECT_TRUE(Editor(path, Container::kFORM)->HasChunk(kBext));
+  for (std::uint64_t size : {138, 0}) {
+    WriteFile(path, FileImage({{kFmt, Pattern(4)}, {sound, {}, size}}, Container::kFORM));
+    const auto editor = Editor(path, Container::kFORM);
+    EXPECT_EQ(editor->AudioRunsToEndOfFile(), size != 0);
+    if (size != 0) editor->AddChunkData({kBext, {}, Blob(Pattern(3))}, sound);
+    EXPECT_EQ(ReadFile(path), FileImage({{kFmt, Pattern(4)}, {sound, {}}}, Container::kFORM));
+    editor->AddChunkData({kBext, {}, Blob(Pattern(3))}, sound);
+    EXPECT_EQ(ReadFile(path),
+              FileImage({{kFmt, Pattern(4)}, {sound, Bytes(8, 0)}, {kBext, Pattern(3)}},
+                        Container::kFORM));
+    EXPECT_TRUE(Editor(path, Container::kFORM)->HasChunk(kBext)) << size;
+  }
 }
 
 // A last chunk cut short stays listed at its claimed size; an edit then

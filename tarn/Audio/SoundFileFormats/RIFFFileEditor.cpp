@@ -461,18 +461,6 @@ void RIFFFileEditor::WriteSegmentActions(const ChunkData* chunk, const UUIDObj& 
         removed = true;
         continue;  // a cut chunk ends nothing: the end stays where it was
       case kFixAudioHeader:
-        if (info.tag == kSoundTag && info.length == 0) {
-          // Nothing follows the header, and "SSND" of size 0 would list
-          // again as running to the end, over every chunk appended later:
-          // the chunk gets the zero offset and block size of an empty one,
-          // written past the end of the file, and the container grows.
-          static constexpr std::uint8_t kEmptySound[8] = {};
-          stream_->MoveTo(info.offset + headerSize);
-          stream_->PutRawDataToStream(kEmptySound, sizeof kEmptySound);
-          info.length = sizeof kEmptySound;
-          stream_->MoveTo(GetIDSize());
-          WriteLength(info.offset + info.length);  // the container ends with this chunk
-        }
         stream_->MoveTo(info.offset);
         WriteRIFFType(info.tag, info.uuid);
         WriteLength(info.length);
@@ -497,6 +485,7 @@ void RIFFFileEditor::WriteSegmentActions(const ChunkData* chunk, const UUIDObj& 
     WriteLength(end - headerSize);
     stream_->Truncate(end);
   } else if (!written && chunk) {
+    end = CompleteEmptySoundChunk(end);
     const std::int64_t fileLength = stream_->Size();
     const std::int64_t paddedLength = WAVEWriter::PadDataLength(fileLength, wave64_);
     if (end > fileLength && paddedLength > fileLength && paddedLength >= end) {
@@ -518,6 +507,23 @@ void RIFFFileEditor::WriteSegmentActions(const ChunkData* chunk, const UUIDObj& 
   }
   if (removed) RemoveOverwrittenChunks();
   access.Restore();
+}
+
+std::int64_t RIFFFileEditor::CompleteEmptySoundChunk(std::int64_t end) {
+  if (endian_ != kRIFFBigEndian || chunks_.empty()) return end;
+  ChunkInfo& last = chunks_.back().first;
+  if (FindChunk(kSoundTag) != std::prev(chunks_.end()) || last.length != 0) return end;
+  // An "SSND" payload starts with its offset and block size; of size 0, with
+  // chunks after it, the audio chunk would list as a recording that runs to
+  // the end of the file, over them. Written past the end of the file.
+  static constexpr std::uint8_t kEmptySound[8] = {};
+  stream_->MoveTo(end);
+  stream_->PutRawDataToStream(kEmptySound, sizeof kEmptySound);
+  last.length = sizeof kEmptySound;
+  stream_->MoveTo(last.offset);
+  WriteRIFFType(last.tag, last.uuid);
+  WriteLength(last.length);
+  return end + last.length;
 }
 
 void RIFFFileEditor::MaybeJunkSegment(RIFFType tag) {

@@ -28,10 +28,10 @@
 //     rewritten and the file is cut to its new end;
 //   - when the audio chunk was listed as running past the end of the file (a
 //     recording whose sizes were never written), that call only rewrites the
-//     audio chunk's identifier and size field and adds nothing (except to an
-//     "SSND" chunk with no bytes after its header, which gets the eight zero
-//     bytes of an empty one: of size 0 it would list as running to the end
-//     again).
+//     audio chunk's identifier and size field and adds nothing;
+//   - an empty "SSND" audio chunk (size 0) that a chunk is appended after
+//     first gets the eight zero bytes of its offset and block size: of size
+//     0 with chunks after it, it would list as running to the end.
 // Only metadata regions are written: the bytes of the audio payload are never
 // read for an edit nor written. An edit that fails half-way (full disk, I/O
 // error) leaves the audio payload intact and the chunks up to and including
@@ -266,6 +266,9 @@ class RIFFFileEditor {
   void DetermineSegmentActions(const ChunkData* chunk, RIFFType audioTag);
   void ApplySegmentActions(const ChunkData* chunk, const UUIDObj& uuid, RIFFType audioTag);
   void WriteSegmentActions(const ChunkData* chunk, const UUIDObj& uuid);
+  // Before an append at `end`: an empty "SSND" audio chunk listed last gets
+  // its zero offset and block size. Returns where the append goes.
+  std::int64_t CompleteEmptySoundChunk(std::int64_t end);
   void ForgetListing() noexcept;
   void JunkThisSegment(ChunkInfo& info);
   void OverwriteThisSegment(ChunkInfo& info, const ChunkData& chunk, const UUIDObj& uuid);
